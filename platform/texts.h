@@ -1,0 +1,41 @@
+// The readers of the management interface's texts.
+//
+// Threads: parsed files are shared between threads and read again only when the file has changed;
+// one object belongs to one thread at a time.
+#pragma once
+
+#include <json/value.h>
+
+#include <string>
+
+#include "platform/conf.h"
+
+namespace ORVA::ZUM {
+
+// Finds the separately installed applications that bring texts of their own.
+class JSConfigParser {
+  public:
+    explicit JSConfigParser(const std::string& language);
+
+    // Reads apps/<name>/app.json of every installed application below the web root. An application
+    // whose file is missing or damaged is left out, and one log line says so.
+    void Parse();
+
+    // An object: application id -> directory of that application's texts in this parser's language
+    // ("en" where it has none in it), relative to the web root. Empty before Parse().
+    Json::Value GetTexts() const;
+
+  private:
+    OrvaConf conf;
+    std::string language;
+    Json::Value texts;
+};
+
+class LocalizedStringParser {
+  public:
+    // The texts of `directory`, an absolute path of the appliance: its file strings.json, an object
+    // {section: {key: text}}. An empty object when the file is missing or is not such a document.
+    Json::Value ParseTexts(const std::string& directory) const;
+};
+
+}  // namespace ORVA::ZUM
