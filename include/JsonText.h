@@ -1,0 +1,15 @@
+// Application sections as compact JSON text, in the form that task records have always held: the
+// writer ends its text with a newline, the reader keeps comments. Both use jsoncpp's older reader
+// and writer, whose output stored tasks depend on.
+#pragma once
+
+#include <json/value.h>
+
+#include <string>
+
+// Compact text of `value`, ended by a newline.
+std::string WriteJsonText(const Json::Value& value);
+
+// Parses `text` into `value`. False when it is not JSON; `value` then holds whatever the reader
+// produced. jsoncpp throws on nesting deeper than it supports.
+bool ParseJsonText(const std::string& text, Json::Value& value);

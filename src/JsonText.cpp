@@ -1,0 +1,13 @@
+#include "include/JsonText.h"
+
+#include <json/reader.h>
+#include <json/writer.h>
+
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+
+std::string WriteJsonText(const Json::Value& value) { return Json::FastWriter().write(value); }
+
+bool ParseJsonText(const std::string& text, Json::Value& value) {
+    constexpr bool kCollectComments = true;
+    return Json::Reader().parse(text, value, kCollectComments);
+}

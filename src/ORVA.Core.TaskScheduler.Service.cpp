@@ -1,0 +1,345 @@
+#include <strings.h>
+#include <syslog.h>
+
+#include <array>
+#include <cstring>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <utility>
+#include <vector>
+
+#include "include/JsonMember.h"
+#include "include/JsonText.h"
+#include "include/TaskSchedulerServiceHandler.h"
+#include "include/lib.h"
+#include "platform/conf.h"
+#include "platform/package.h"
+#include "platform/qlibc.h"
+
+namespace {
+
+constexpr const char* kSourceFile = "ORVA.Core.TaskScheduler.Service.cpp";
+
+// The section that the task keeps, and the entries of its catalogue.
+constexpr const char* kStore = "service_store";
+constexpr const char* kStoredAction = "service_action";
+constexpr const char* kName = "name";
+constexpr const char* kDisplayName = "display_name";
+constexpr const char* kServiceType = "service_type";
+constexpr const char* kEnabled = "enabled";
+
+constexpr const char* kStoredStop = "0";
+constexpr const char* kStoredStart = "1";
+constexpr int kBuiltInService = 1;
+constexpr int kPackage = 2;
+
+// The form.
+constexpr const char* kServices = "services";
+constexpr const char* kAction = "action";
+constexpr const char* kFormStop = "stop";
+constexpr const char* kFormStart = "start";
+
+struct ServiceRow {
+    // The word that the service tool knows the service by.
+    const char* key;
+    // The configuration key that must say "yes" for the service to be offered; null when it always
+    // is.
+    const char* condition;
+};
+constexpr std::array kServiceTable = {
+    ServiceRow{"Samba", nullptr},          ServiceRow{"AFP", nullptr},
+    ServiceRow{"BonjourPrinter", nullptr}, ServiceRow{"NFS", "supportNFS"},
+    ServiceRow{"AutoBlock", nullptr},      ServiceRow{"FTP", nullptr},
+    ServiceRow{"FTPES", nullptr},          ServiceRow{"SFTP", nullptr},
+    ServiceRow{"WebDeck", "supportweb"},   ServiceRow{"WebDAV", nullptr},
+    ServiceRow{"SecureWebDAV", nullptr},   ServiceRow{"NTP", nullptr},
+};
+
+// The platform's string hash; setting a value may move the table.
+class StringHash {
+  public:
+    explicit StringHash(int size) : table(QLIBCSzHashAlloc(size)) {}
+    ~StringHash() { QLIBCSzHashFree(table); }
+    StringHash(const StringHash&) = delete;
+    StringHash& operator=(const StringHash&) = delete;
+
+    explicit operator bool() const { return table != nullptr; }
+    void Set(const char* key, const char* value) { QLIBCSzHashSetValue(&table, key, value); }
+    const char* Get(const char* key) const { return QLIBCSzHashGetValue(table, key); }
+
+  private:
+    QLIBC_SZHASH* table;
+};
+
+bool IsOfType(const Json::Value& entry, int serviceType) {
+    const Json::Value& type = MemberOf(entry, kServiceType);
+    return type.isInt() && type.asInt() == serviceType;
+}
+
+Json::Value NewEntry(const std::string& name, int serviceType, const std::string& displayName) {
+    Json::Value entry(Json::objectValue);
+    entry[kEnabled] = false;
+    entry[kName] = name;
+    entry[kServiceType] = serviceType;
+    entry[kDisplayName] = displayName;
+    return entry;
+}
+
+void AddServices(Json::Value& entries) {
+    const OrvaConf conf;
+    for (const ServiceRow& row : kServiceTable) {
+        const bool offered = row.condition == nullptr ||
+                             strcasecmp(conf.Def(row.condition, "no").c_str(), "yes") == 0;
+        if (offered) {
+            entries.append(NewEntry(row.key, kBuiltInService, ""));
+        }
+    }
+}
+
+// An installed package that can be chosen.
+struct Package {
+    std::string id;
+    std::string displayName;
+};
+
+// Appends the packages that can be chosen, in the package manager's order. 0, or -1 with `packages`
+// unchanged when there is no package manager to ask. The line number is part of the log's contract.
+int AddPackages(std::vector<Package>& packages) {
+    ORVAPackageTool::PackageManager manager;
+    if (!manager.init()) {
+        syslog(LOG_ERR, "%s:%d init PackageManager failed", kSourceFile, 97);
+        return -1;
+    }
+    for (const std::string& id : manager.enumPackages(nullptr)) {
+        ORVAPackageTool::PackageInfo info;
+        const bool known = manager.getPackageInfo(id, info, nullptr);
+        if (known && !info.startable) {
+            continue;
+        }
+        packages.push_back({id, known ? info.displayName : id});
+    }
+    return 0;
+}
+
+// A catalogue goes on without the packages: the built-in services can still be chosen.
+std::vector<Package> InstalledPackages() {
+    std::vector<Package> packages;
+    if (AddPackages(packages) < 0) {
+        syslog(LOG_ERR, "addPackage failed");
+    }
+    return packages;
+}
+
+Json::Value PackageEntry(const Package& package) {
+    return NewEntry(package.id, kPackage, package.displayName);
+}
+
+// The entries of `stored`, which are used up, in their order and without the packages that are no
+// longer installed; then those that are new. False when memory is short; the line number is part of
+// the log's contract.
+bool RefreshCatalogue(Json::Value& stored, const std::vector<Package>& installed,
+                      Json::Value& refreshed) {
+    constexpr const char* kInstalled = "i";
+    constexpr const char* kPresent = "-1";
+
+    StringHash states(128);
+    if (!states) {
+        syslog(LOG_ERR, "%s:%d hash alloc failed", kSourceFile, 168);
+        return false;
+    }
+    for (const Package& package : installed) {
+        states.Set(package.id.c_str(), kInstalled);
+    }
+
+    refreshed = Json::Value(Json::arrayValue);
+    if (stored.isArray()) {
+        for (Json::Value& entry : stored) {
+            if (!IsOfType(entry, kBuiltInService)) {
+                const Json::Value& name = MemberOf(entry, kName);
+                if (!name.isString() || states.Get(name.asCString()) == nullptr) {
+                    continue;
+                }
+                states.Set(name.asCString(), kPresent);
+            }
+            refreshed.append(std::move(entry));
+        }
+    }
+    for (const Package& package : installed) {
+        const char* const state = states.Get(package.id.c_str());
+        if (state != nullptr && std::strcmp(state, kPresent) != 0) {
+            refreshed.append(PackageEntry(package));
+        }
+    }
+    return true;
+}
+
+// The form's element of one stored entry, in place.
+void EntryToForm(Json::Value& entry) {
+    entry["type"] = IsOfType(entry, kBuiltInService) ? "service" : "package";
+    entry["id"] = entry[kName];
+    if (IsOfType(entry, kPackage)) {
+        entry[kName] = std::move(entry[kDisplayName]);
+    }
+    entry["enable"] = std::move(entry[kEnabled]);
+    for (const char* key : {kEnabled, kDisplayName, kServiceType}) {
+        entry.removeMember(key);
+    }
+}
+
+std::string_view TextViewOf(const Json::Value& text) {
+    const char* begin = nullptr;
+    const char* end = nullptr;
+    text.getString(&begin, &end);
+    return {begin, static_cast<std::size_t>(end - begin)};
+}
+
+// Sets "enabled" of the entries that the form's `services` name; a service named twice gets its
+// last choice. False, with nothing changed, when an element is no choice.
+bool ApplyChoices(const Json::Value& services, Json::Value& store) {
+    std::unordered_map<std::string_view, bool> choices;
+    choices.reserve(services.size());
+    for (const Json::Value& service : services) {
+        const Json::Value& id = MemberOf(service, "id");
+        const Json::Value& enable = MemberOf(service, "enable");
+        if (!id.isString() || !enable.isBool()) {
+            return false;
+        }
+        choices[TextViewOf(id)] = enable.asBool();
+    }
+    for (Json::Value& entry : store) {
+        const Json::Value& name = MemberOf(entry, kName);
+        if (!name.isString()) {
+            continue;
+        }
+        const auto choice = choices.find(TextViewOf(name));
+        if (choice != choices.end()) {
+            entry[kEnabled] = choice->second;
+        }
+    }
+    return true;
+}
+
+// A damaged entry counts as not chosen.
+bool IsChosen(const Json::Value& entry) {
+    const Json::Value& enabled = MemberOf(entry, kEnabled);
+    return enabled.isBool() && enabled.asBool() && MemberOf(entry, kName).isString();
+}
+
+}  // namespace
+
+bool TaskSchedulerServiceHandler::ConvertToJson_App(const _tag_orva_sched_task_& task,
+                                                    Json::Value& document) {
+    Json::Value app(Json::objectValue);
+    if (ORVASchedTaskIsNew(task)) {
+        Json::Value catalogue(Json::arrayValue);
+        AddServices(catalogue);
+        for (const Package& package : InstalledPackages()) {
+            catalogue.append(PackageEntry(package));
+        }
+        app[kStore] = std::move(catalogue);
+        app[kStoredAction] = kStoredStop;
+    } else {
+        const std::vector<Package> installed = InstalledPackages();
+        ParseJsonText(ORVASchedTaskGetAppArgs(task), app);
+        if (!app.isObject()) {
+            app = Json::Value(Json::objectValue);
+        }
+        Json::Value refreshed;
+        if (!RefreshCatalogue(app[kStore], installed, refreshed)) {
+            return false;
+        }
+        app[kStore] = std::move(refreshed);
+    }
+    document["app"] = std::move(app);
+    return true;
+}
+
+bool TaskSchedulerServiceHandler::ConvertFromJson_App(const Json::Value& document,
+                                                      _tag_orva_sched_task_& task) {
+    const Json::Value& app = document["app"];
+    ORVASchedCTaskSetEditForm(&task, "ORVA.ZUM.TaskScheduler.Service.FormPanel");
+    ORVASchedCTaskSetCanEditOwner(&task, 0);
+    ORVASchedCTaskSetCanRunAppSameTime(&task, 0);
+    ORVASchedCTaskSetCanRunTaskSameTime(&task, 0);
+    ORVASchedCTaskSetApp(&task, "ORVA.ZUM.TaskScheduler.Service");
+    ORVASchedCTaskSetAppName(&task, "#service:service_subject#");
+    ORVASchedCTaskSetAppArgs(&task, WriteJsonText(app).c_str());
+
+    const Json::Value& storedAction = MemberOf(app, kStoredAction);
+    const bool stop = storedAction == kStoredStop;
+    if (!stop && storedAction != kStoredStart) {
+        return false;
+    }
+    const Json::Value& store = MemberOf(app, kStore);
+    if (!store.isArray() || store.empty()) {
+        return false;
+    }
+
+    std::string action = stop ? "#common:stop_service#:" : "#common:start_service#:";
+    const std::string serviceTool =
+        stop ? "/tmp/orvaschedtool --stop-service" : "/tmp/orvaschedtool --start-service";
+    const std::string packageTool =
+        stop ? "/usr/orva/bin/orvapkg stop " : "/usr/orva/bin/orvapkg start ";
+    std::string serviceWords;
+    std::string packageLines;
+    for (const Json::Value& entry : store) {
+        if (!IsChosen(entry)) {
+            continue;
+        }
+        const std::string name = entry[kName].asString();
+        action += " \"" + name + "\"";
+        if (IsOfType(entry, kBuiltInService)) {
+            serviceWords += " " + EscapeShellName(name);
+        } else {
+            packageLines += packageTool + EscapeShellName(name) + ";\n";
+        }
+    }
+    // The built-in services come first whatever the order of the choices: one call serves them all.
+    const std::string serviceLine =
+        serviceWords.empty() ? std::string() : serviceTool + serviceWords + ";\n";
+    ORVASchedCTaskSetAction(&task, action.c_str());
+    ORVASchedCTaskSetCommand(&task, (serviceLine + packageLines).c_str());
+    return true;
+}
+
+bool TaskSchedulerServiceHandler::ReConstructJsonGet_App(Json::Value& app) {
+    if (!MemberOf(app, kStore).isArray() || !MemberOf(app, kStoredAction).isString()) {
+        return false;
+    }
+    Json::Value services = std::move(app[kStore]);
+    for (Json::Value& entry : services) {
+        if (entry.isObject()) {
+            EntryToForm(entry);
+        }
+    }
+    app[kAction] = app[kStoredAction] == kStoredStop ? kFormStop : kFormStart;
+    app[kServices] = std::move(services);
+    app.removeMember(kStore);
+    app.removeMember(kStoredAction);
+    return true;
+}
+
+bool TaskSchedulerServiceHandler::ReConstructJsonSet_App(Json::Value& app) {
+    Json::Value stored;
+    if (!GetOriginAppObj(stored)) {
+        return false;
+    }
+    const Json::Value& form = app;
+    const Json::Value& action = form[kAction];
+    if (action == kFormStop) {
+        stored[kStoredAction] = kStoredStop;
+    } else if (action == kFormStart) {
+        stored[kStoredAction] = kStoredStart;
+    } else if (action.isString()) {
+        return false;
+    }
+    const Json::Value& services = form[kServices];
+    if (services.isArray() && !ApplyChoices(services, stored[kStore])) {
+        return false;
+    }
+    app = std::move(stored);
+    return true;
+}
+
+bool TaskSchedulerServiceHandler::GetAppEditOwnerValue() { return false; }
