@@ -1,0 +1,34 @@
+#pragma once
+
+#include <functional>
+#include <optional>
+#include <string>
+
+#include "appliance/recycle/FileInfo.h"
+#include "appliance/util/FileDescriptor.h"
+
+namespace orva {
+
+inline constexpr const char* kBinFolder = ".recycle";
+
+// A share's bin, open and locked: the kernel holds the lock until `bin` is closed.
+struct OpenBin {
+    FileDescriptor share;
+    FileDescriptor bin;
+    FileInfo info;
+};
+
+struct BinOpening {
+    std::optional<OpenBin> bin;
+    bool noBin = false;     // the share has none
+    bool noFolder = false;  // not even the share's folder is there
+    std::string problem;    // why it cannot be opened, in words
+};
+
+// Opens the bin of the share whose folder is `directory` (a real path). Neither may be a link. Only
+// one clean works in a bin at a time, previews beside each other: waits until the others are done,
+// after a call of `waiting` when there is something to wait for.
+BinOpening OpenAndLockBin(const std::string& directory, bool preview,
+                          const std::function<void()>& waiting);
+
+}  // namespace orva

@@ -1,0 +1,209 @@
+#include "appliance/share/ShareRegistry.h"
+
+#include <fcntl.h>
+#include <json/writer.h>
+#include <sys/file.h>
+#include <syslog.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstddef>
+#include <string_view>
+#include <utility>
+
+#include "appliance/root/Root.h"
+#include "appliance/share/RecycleBin.h"
+#include "appliance/util/AtomicFile.h"
+#include "appliance/util/Error.h"
+#include "appliance/util/FileDescriptor.h"
+#include "appliance/util/FileRead.h"
+#include "appliance/util/Name.h"
+#include "appliance/util/StrictJson.h"
+
+namespace orva {
+namespace {
+
+constexpr const char* kRegistryFile = "/usr/orva/etc/shares.json";
+constexpr std::size_t kMaxBytes = 16 << 20;
+
+constexpr const char* kShares = "shares";
+constexpr const char* kName = "name";
+constexpr const char* kPath = "path";
+constexpr const char* kKind = "kind";
+constexpr const char* kRecycleBin = "recycle_bin";
+
+bool IsAppliancePath(std::string_view path) {
+    if (path.empty() || path.front() != '/' || path.find('\0') != std::string_view::npos ||
+        ValidUtf8Length(path) != path.size()) {
+        return false;
+    }
+    return (std::string(path) + "/").find("/../") == std::string::npos;
+}
+
+bool IsKind(int kind) { return kind != 0 && (kind & ~kAllShareKinds) == 0; }
+
+bool IsShare(const Json::Value& entry) {
+    return entry.isObject() && entry[kName].isString() && IsSafeName(entry[kName].asString()) &&
+           entry[kPath].isString() && IsAppliancePath(entry[kPath].asString()) &&
+           entry[kKind].isInt() && IsKind(entry[kKind].asInt()) && entry[kRecycleBin].isBool();
+}
+
+// What keeps `document` from being a registry; empty when nothing does.
+std::string FindFault(const Json::Value& document) {
+    if (!document.isObject() || !document[kShares].isArray()) {
+        return "no object with an array \"shares\"";
+    }
+    std::vector<std::string> names;
+    for (const Json::Value& entry : document[kShares]) {
+        if (!IsShare(entry)) {
+            return "element " + std::to_string(names.size()) + " of \"shares\" is no share";
+        }
+        names.push_back(entry[kName].asString());
+    }
+    std::sort(names.begin(), names.end());
+    const auto twice = std::adjacent_find(names.begin(), names.end());
+    return twice == names.end() ? std::string() : "two shares named \"" + *twice + "\"";
+}
+
+// The registry's document, empty one for a missing file.
+std::optional<Json::Value> Load(const std::string& path) {
+    std::string content;
+    FileIdentity identity;
+    if (const int error = ReadFile(path, kMaxBytes, content, identity)) {
+        if (error == ENOENT) {
+            Json::Value empty(Json::objectValue);
+            empty[kShares] = Json::Value(Json::arrayValue);
+            return empty;
+        }
+        Fail(kErrSystem);
+        return std::nullopt;
+    }
+    std::string fault;
+    std::optional<Json::Value> document = ParseStrictJson(content, fault);
+    if (document) {
+        fault = FindFault(std::as_const(*document));
+    }
+    if (!document || !fault.empty()) {
+        ::syslog(LOG_ERR, "%s: %s", path.c_str(), fault.c_str());
+        Fail(kErrBadDocument);
+        return std::nullopt;
+    }
+    return document;
+}
+
+Share ToShare(const Json::Value& entry) {
+    return {entry[kName].asString(), entry[kPath].asString(), entry[kKind].asInt(),
+            entry[kRecycleBin].asBool()};
+}
+
+// The entry of share `name` in the registry's document; null when there is none.
+Json::Value* FindEntry(Json::Value& document, const std::string& name) {
+    for (Json::Value& entry : document[kShares]) {
+        if (entry[kName].asString() == name) {
+            return &entry;
+        }
+    }
+    return nullptr;
+}
+
+int Store(const std::string& path, const Json::Value& document) {
+    Json::StreamWriterBuilder writer;
+    writer["indentation"] = "  ";
+    writer["emitUTF8"] = true;
+    return WriteFileAtomically(path, Json::writeString(writer, document) + "\n");
+}
+
+// Keeps other writers of the registry away while it lives. The lock has a file of its own because
+// the registry is replaced, and a lock on the replaced file would hold nobody.
+FileDescriptor Lock(const std::string& path) {
+    FileDescriptor file(
+        ::open((path + ".lock").c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0640));
+    while (file.IsOpen() && ::flock(file.Get(), LOCK_EX) != 0) {
+        if (errno != EINTR) {
+            return {};
+        }
+    }
+    return file;
+}
+
+}  // namespace
+
+std::optional<std::vector<Share>> ShareRegistry::List() const {
+    const std::optional<Json::Value> document = Load(ResolvePath(kRegistryFile));
+    if (!document) {
+        return std::nullopt;
+    }
+    std::vector<Share> shares;
+    shares.reserve((*document)[kShares].size());
+    for (const Json::Value& entry : (*document)[kShares]) {
+        shares.push_back(ToShare(entry));
+    }
+    std::sort(shares.begin(), shares.end(),
+              [](const Share& left, const Share& right) { return left.name < right.name; });
+    return shares;
+}
+
+std::optional<Share> ShareRegistry::Find(const std::string& name) const {
+    std::optional<Json::Value> document = Load(ResolvePath(kRegistryFile));
+    if (!document) {
+        return std::nullopt;
+    }
+    const Json::Value* entry = FindEntry(*document, name);
+    if (entry == nullptr) {
+        Fail(kErrNotFound);
+        return std::nullopt;
+    }
+    return ToShare(*entry);
+}
+
+int ShareRegistry::Add(const Share& share) const {
+    if (!IsSafeName(share.name) || !IsAppliancePath(share.path) || !IsKind(share.kind)) {
+        return Fail(kErrBadArgument);
+    }
+    const std::string path = ResolvePath(kRegistryFile);
+    const FileDescriptor lock = Lock(path);
+    if (!lock.IsOpen()) {
+        return Fail(kErrSystem);
+    }
+    std::optional<Json::Value> document = Load(path);
+    if (!document) {
+        return -1;
+    }
+    if (FindEntry(*document, share.name) != nullptr) {
+        return Fail(kErrNotAllowed);
+    }
+    Json::Value entry(Json::objectValue);
+    entry[kName] = share.name;
+    entry[kPath] = share.path;
+    entry[kKind] = share.kind;
+    entry[kRecycleBin] = share.recycleBin;
+    (*document)[kShares].append(std::move(entry));
+    return Store(path, *document);
+}
+
+int ShareRegistry::SetRecycle(const std::string& name, bool enabled) const {
+    const std::string path = ResolvePath(kRegistryFile);
+    const FileDescriptor lock = Lock(path);
+    if (!lock.IsOpen()) {
+        return Fail(kErrSystem);
+    }
+    std::optional<Json::Value> document = Load(path);
+    if (!document) {
+        return -1;
+    }
+    Json::Value* entry = FindEntry(*document, name);
+    if (entry == nullptr) {
+        return Fail(kErrNotFound);
+    }
+    // The folder first: a bin that is said to be on must be there.
+    if (enabled && MakeRecycleBin(ResolvePath((*entry)[kPath].asString())) != 0) {
+        return -1;
+    }
+    if ((*entry)[kRecycleBin].asBool() == enabled) {
+        return 0;
+    }
+    (*entry)[kRecycleBin] = enabled;
+    return Store(path, *document);
+}
+
+}  // namespace orva

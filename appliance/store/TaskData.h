@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+
+#include "appliance/schedule/Schedule.h"
+
+namespace orva {
+
+// The yes-or-no properties of a task. Their values are stored: new ones take the next free bit.
+enum TaskFlag : std::uint16_t {
+    kEnabled = 1U << 0,
+    kListable = 1U << 1,
+    kSimpleEditForm = 1U << 2,
+    kCanEditName = 1U << 3,
+    kCanEditOwner = 1U << 4,
+    kCanRunTaskSameTime = 1U << 5,
+    kCanRunAppSameTime = 1U << 6,
+    kCanRunFromUI = 1U << 7,
+    kCanEditFromUI = 1U << 8,
+    kCanDeleteFromUI = 1U << 9,
+};
+
+constexpr std::uint16_t kNewTaskFlags =
+    kEnabled | kListable | kCanEditName | kCanRunFromUI | kCanEditFromUI | kCanDeleteFromUI;
+
+constexpr int kNewTaskId = -1;
+
+// What is stored of a task. Immutable once it is shared between threads.
+struct TaskData {
+    int id = kNewTaskId;
+    std::uint16_t flags = kNewTaskFlags;
+    std::string name;
+    std::string owner;
+    std::string app;
+    std::string appName;
+    std::string appArgs;
+    std::string action;
+    std::string command;
+    std::string editForm;
+    Schedule schedule;
+
+    bool Has(TaskFlag flag) const { return (flags & flag) != 0; }
+    void Set(TaskFlag flag, bool on) {
+        flags = static_cast<std::uint16_t>(on ? flags | flag : flags & ~flag);
+    }
+    bool operator==(const TaskData&) const = default;
+};
+
+using SharedTask = std::shared_ptr<const TaskData>;
+
+}  // namespace orva

@@ -1,0 +1,47 @@
+// Tasks and queued runs as rows. Functions throw SQLite::Exception and StoreFailure; those that
+// change something belong inside a Transaction.
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "appliance/store/Connection.h"
+#include "appliance/store/NextStartTime.h"
+#include "appliance/store/TaskData.h"
+
+namespace orva {
+
+std::optional<TaskData> ReadTask(Connection& connection, int id);
+
+// All tasks in ascending order of id.
+std::vector<SharedTask> ReadAllTasks(Connection& connection);
+
+// Stores a new task and yields its id: `task.id`, which must never have been used, or the next free
+// one when that is kNewTaskId.
+int InsertTask(Connection& connection, const TaskData& task, StartSecond nextStart);
+
+// Replaces the stored task with the id of `task`. False when there is none.
+[[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart);
+
+// Removes the task with its queued runs. False when there is none.
+[[nodiscard]] bool RemoveTask(Connection& connection, int id);
+
+// The highest id that was ever given to a task; 0 when there was none.
+std::int64_t HighestTaskId(Connection& connection);
+
+// The number of the newest change; 0 when there was none.
+std::int64_t NewestChange(Connection& connection);
+
+// The ids of the tasks that changed after change number `after`, in ascending order, each once.
+// Nothing when that is too long ago to tell, or more than `most` changes.
+std::optional<std::vector<int>> TasksChangedAfter(Connection& connection, std::int64_t after,
+                                                  std::int64_t most);
+
+// Queues a run that was asked for by hand. False when there is no such task.
+[[nodiscard]] bool QueueRun(Connection& connection, int task, std::int64_t nowSecond,
+                            const std::string& program, const std::string& account);
+
+}  // namespace orva
