@@ -1,0 +1,136 @@
+#include "appliance/recycle/SizeCleaner.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <unistd.h>
+
+#include "tests/appliance/recycle/BinTest.h"
+
+namespace orva {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Pair;
+using testing::UnorderedElementsAre;
+
+class SizeCleanerTest : public BinTest {
+  protected:
+    static CleanRules Limit(std::uint64_t bytes, SizeOrder order = SizeOrder::kOldestFirst) {
+        CleanRules rules;
+        rules.sizeLimit = bytes;
+        rules.order = order;
+        return rules;
+    }
+};
+
+TEST_F(SizeCleanerTest, RemovesTheOldestUntilTheRestFits) {
+    File("b/first", 10);
+    File("a/second", 10);
+    File("third", 10);
+    const CleanTotals totals = Clean(Limit(15));
+    EXPECT_THAT(Contents(), ElementsAre("third"));
+    EXPECT_EQ(totals.removedFiles, 2U);
+    EXPECT_EQ(totals.removedDirectories, 2U);
+    EXPECT_EQ(totals.keptBytes, 10U);
+    EXPECT_EQ(totals.overLimit, 0U);
+}
+
+TEST_F(SizeCleanerTest, RemovesTheLargestUntilTheRestFits) {
+    File("small", 1);
+    File("large", 100);
+    File("middle", 50);
+    Clean(Limit(51, SizeOrder::kLargestFirst));
+    EXPECT_THAT(Contents(), UnorderedElementsAre("small", "middle"));
+}
+
+TEST_F(SizeCleanerTest, RemovesNoFileWhenTheBinFitsExactly) {
+    File("a", 10);
+    File("b", 5);
+    EXPECT_EQ(Clean(Limit(15)).removedFiles, 0U);
+    EXPECT_EQ(Clean(Limit(14)).removedFiles, 1U);
+    EXPECT_THAT(Contents(), ElementsAre("b"));
+}
+
+TEST_F(SizeCleanerTest, RemovesTheOldestOfEquallyLargeFilesFirst) {
+    File("z", 10);
+    File("a", 10);
+    File("m", 10);
+    Preview(Limit(5, SizeOrder::kLargestFirst));
+    EXPECT_THAT(report->goes, ElementsAre("z", "a", "m"));
+}
+
+TEST_F(SizeCleanerTest, TakesFilesOfOneTimeInTheOrderOfTheirPaths) {
+    // Hard links share their size and their time.
+    File("start", 10);
+    for (const char* folder : {"b", "a", "a/c", "a/b"}) {
+        Directory(folder);
+    }
+    for (const char* name : {"b/1", "a/z", "a/c/0", "a/b/2", "a/b/1", "a/y"}) {
+        ASSERT_EQ(::link(InBin("start").c_str(), InBin(name).c_str()), 0);
+    }
+    Preview(Limit(0));
+    std::vector<std::string> files;
+    for (const std::string& path : report->goes) {
+        if (path.back() != '/') {
+            files.push_back(path);
+        }
+    }
+    EXPECT_THAT(files, ElementsAre("start", "a/y", "a/z", "a/b/1", "a/b/2", "a/c/0", "b/1"));
+    Clean(Limit(0));
+    EXPECT_THAT(Contents(), IsEmpty());
+}
+
+TEST_F(SizeCleanerTest, CountsKeptFilesAndNeverRemovesThem) {
+    File("keep.doc", 100);
+    File("go", 10);
+    CleanRules rules = Limit(50);
+    rules.keepExtensions = {"doc"};
+    const CleanTotals totals = Clean(rules);
+    EXPECT_THAT(Contents(), ElementsAre("keep.doc"));
+    EXPECT_EQ(totals.overLimit, 50U);
+    EXPECT_EQ(totals.failures, 0U);
+}
+
+TEST_F(SizeCleanerTest, RemovesEmptyFoldersWhateverTheSize) {
+    File("file", 1);
+    Directory("empty/inside");
+    const CleanTotals totals = Clean(Limit(100));
+    EXPECT_THAT(Contents(), ElementsAre("file"));
+    EXPECT_EQ(totals.removedDirectories, 2U);
+}
+
+TEST_F(SizeCleanerTest, CountsFilesWithMoreBytesThanCanBeCounted) {
+    // Each claims almost 2^63 bytes on the file systems that can; fewer on others.
+    constexpr off_t kHuge[] = {0x7FFFFFFFFFFFF000, 0xFFFFFFFF000};
+    for (const char* name : {"a", "b", "c"}) {
+        File(name);
+        if (::truncate(InBin(name).c_str(), kHuge[0]) != 0) {
+            ASSERT_EQ(::truncate(InBin(name).c_str(), kHuge[1]), 0);
+        }
+    }
+    const CleanTotals totals = Clean(Limit(0));
+    EXPECT_EQ(totals.removedFiles, 3U);
+    EXPECT_THAT(Contents(), IsEmpty());
+}
+
+TEST_F(SizeCleanerTest, PreviewsWhatItThenDoes) {
+    File("a/one", 10);
+    File("a/two", 20);
+    File("b/keep.doc", 5);
+    File("three", 30);
+    CleanRules rules = Limit(40);
+    rules.keepExtensions = {"doc"};
+    const CleanTotals foreseen = Preview(rules);
+    EXPECT_THAT(report->goes, ElementsAre("a/one", "a/two", "a/"));
+    EXPECT_THAT(report->stays,
+                ElementsAre(Pair("b/keep.doc", "extension"), Pair("three", "within_size")));
+    const CleanTotals totals = Clean(rules);
+    EXPECT_THAT(Contents(), UnorderedElementsAre("b/", "b/keep.doc", "three"));
+    EXPECT_EQ(foreseen.removedBytes, totals.removedBytes);
+    EXPECT_EQ(foreseen.removedDirectories, totals.removedDirectories);
+    EXPECT_EQ(foreseen.keptBytes, totals.keptBytes);
+}
+
+}  // namespace
+}  // namespace orva

@@ -1,0 +1,201 @@
+#include <gmock/gmock.h>
+
+#include <fcntl.h>
+#include <sys/file.h>
+
+#include "appliance/store/Accounts.h"
+#include "appliance/util/Error.h"
+#include "appliance/util/FileDescriptor.h"
+#include "platform/qlibc.h"
+#include "platform/schedtask.h"
+#include "tests/appliance/store/StoreTest.h"
+
+namespace {
+
+using SchedTaskRecordsTest = StoreTest;
+
+int SaveSample(const std::string& name) {
+    const Record task;
+    Json::Value doc;
+    doc["basic"]["id"] = "-1";
+    doc["basic"]["task_name"] = name;
+    EXPECT_TRUE(ORVASchedTaskConvertFromJson_Basic(doc, *task));
+    ORVASchedCTaskSetApp(task.Get(), "ORVA.ZUM.TaskScheduler.Script");
+    EXPECT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    return ORVASchedTaskGetID(*task);
+}
+
+TEST_F(SchedTaskRecordsTest, ANewRecordHasTheDefaultsOfANewTask) {
+    const Record task;
+    EXPECT_EQ(ORVASchedTaskGetID(*task), -1);
+    EXPECT_TRUE(ORVASchedTaskIsNew(*task));
+    EXPECT_TRUE(ORVASchedTaskIsEnabled(*task));
+    EXPECT_TRUE(ORVASchedTaskIsListable(*task));
+    EXPECT_TRUE(ORVASchedTaskIsCanRunFromUI(*task));
+    EXPECT_TRUE(ORVASchedTaskIsCanEditFromUI(*task));
+    EXPECT_TRUE(ORVASchedTaskIsCanDeleteFromUI(*task));
+    EXPECT_EQ(ORVASchedTaskGetName(*task), "");
+    EXPECT_EQ(ORVASchedTaskGetApp(*task), "");
+    EXPECT_EQ(ORVASchedTaskGetAppArgs(*task), "");
+    EXPECT_EQ(ORVASchedTaskGetNextTriggerTime(*task), "2026-05-02 00:00");
+    Json::Value doc;
+    EXPECT_TRUE(ORVASchedTaskConvertToJson_Basic(*task, doc));
+    EXPECT_EQ(doc["basic"]["owner"].asString(), orva::OwnAccount());
+    EXPECT_TRUE(doc["basic"]["can_edit_name"].asBool());
+    for (const char* flag : {"simple_edit_form", "can_edit_owner", "can_run_task_same_time",
+                             "can_run_app_same_time"}) {
+        EXPECT_FALSE(doc["basic"][flag].asBool()) << flag;
+    }
+}
+
+TEST_F(SchedTaskRecordsTest, WhatTheWritersSetIsStoredAndRead) {
+    const int id = SaveSample("a");
+    {
+        const Record task;
+        ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+        EXPECT_EQ(ORVASchedCTaskSetEditForm(task.Get(), "form"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetAppName(task.Get(), "app name"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetApp(task.Get(), "app"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetAppArgs(task.Get(), "args\n"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetAction(task.Get(), "action"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetCommand(task.Get(), "command"), 0);
+        EXPECT_EQ(ORVASchedCTaskSetSimpleEditForm(task.Get(), 1), 0);
+        EXPECT_EQ(ORVASchedCTaskSetCanEditName(task.Get(), 0), 0);
+        EXPECT_EQ(ORVASchedCTaskSetCanEditOwner(task.Get(), 1), 0);
+        EXPECT_EQ(ORVASchedCTaskSetCanRunTaskSameTime(task.Get(), 1), 0);
+        EXPECT_EQ(ORVASchedCTaskSetCanRunAppSameTime(task.Get(), 1), 0);
+        EXPECT_EQ(ORVASchedCTaskSetListable(task.Get(), 0), 0);
+        EXPECT_EQ(ORVASchedCTaskSetState(task.Get(), false), 0);
+        EXPECT_EQ(ORVASchedTaskGetNextTriggerTime(*task), "N/A");
+        ASSERT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    }
+    Reopen();
+    const orva::SharedTask stored = orva::TaskStore::Current()->Find(id);
+    EXPECT_EQ(stored->editForm, "form");
+    EXPECT_EQ(stored->command, "command");
+    EXPECT_EQ(stored->flags, orva::kSimpleEditForm | orva::kCanEditOwner |
+                                 orva::kCanRunTaskSameTime | orva::kCanRunAppSameTime |
+                                 orva::kCanRunFromUI | orva::kCanEditFromUI |
+                                 orva::kCanDeleteFromUI);
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetID(*task), id);
+    EXPECT_FALSE(ORVASchedTaskIsNew(*task));
+    EXPECT_EQ(ORVASchedTaskGetName(*task), "a");
+    EXPECT_EQ(ORVASchedTaskGetApp(*task), "app");
+    EXPECT_EQ(ORVASchedTaskGetAppName(*task), "app name");
+    EXPECT_EQ(ORVASchedTaskGetAppArgs(*task), "args\n");
+    EXPECT_EQ(ORVASchedTaskGetAction(*task), "action");
+    EXPECT_FALSE(ORVASchedTaskIsEnabled(*task));
+    EXPECT_FALSE(ORVASchedTaskIsListable(*task));
+    EXPECT_EQ(ORVASchedTaskGetNextTriggerTime(*task), "N/A");
+}
+
+TEST_F(SchedTaskRecordsTest, ASavedNewRecordHasItsIdAndReplacesItselfAfterwards) {
+    const Record task;
+    Json::Value doc;
+    doc["basic"]["id"] = "-1";
+    doc["basic"]["task_name"] = "a";
+    ASSERT_TRUE(ORVASchedTaskConvertFromJson_Basic(doc, *task));
+    ORVASchedCTaskSetApp(task.Get(), "app");
+    ASSERT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetID(*task), 1);
+    EXPECT_FALSE(ORVASchedTaskIsNew(*task));
+    ASSERT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetID(*task), 1);
+}
+
+TEST_F(SchedTaskRecordsTest, ATaskWithoutANameOrAnAppCannotBeSaved) {
+    const Record task;
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
+    ORVASchedCTaskSetApp(task.Get(), "app");
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    const int id = SaveSample("a");
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    ORVASchedCTaskSetApp(task.Get(), "");
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(orva::TaskStore::Current()->CurrentSnapshot()->Count(), 1U);
+}
+
+TEST_F(SchedTaskRecordsTest, LoadingMinusOneGivesANewRecord) {
+    const int id = SaveSample("a");
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskLoad(-1, task.Get()), 0);
+    EXPECT_TRUE(ORVASchedTaskIsNew(*task));
+    EXPECT_EQ(ORVASchedTaskGetName(*task), "");
+}
+
+TEST_F(SchedTaskRecordsTest, AnUnknownIdCannotBeLoadedAndTheRecordKeepsWhatItHas) {
+    const int id = SaveSample("a");
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    for (const int unknown : {0, 2, -2, 2147483647, -2147483647 - 1}) {
+        EXPECT_LT(ORVASchedTaskLoad(unknown, task.Get()), 0) << unknown;
+        EXPECT_EQ(QLIBCErrGet(), orva::kErrNotFound);
+        EXPECT_STREQ(QLIBCErrorGetFile(), "SchedTaskRecords.cpp");
+        EXPECT_GT(QLIBCErrorGetLine(), 0);
+    }
+    EXPECT_EQ(ORVASchedTaskGetName(*task), "a");
+}
+
+TEST_F(SchedTaskRecordsTest, ARemovedTaskIsGone) {
+    const int id = SaveSample("a");
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskRemove(id), 0);
+    EXPECT_LT(ORVASchedTaskRemove(id), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrNotFound);
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrNotFound);
+}
+
+TEST_F(SchedTaskRecordsTest, RunSaysWhyItCannot) {
+    const int id = SaveSample("a");
+    EXPECT_LT(ORVASchedTaskRun(id, 0, 0), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrNotAllowed);
+    const Record task;
+    ORVASchedTaskLoad(id, task.Get());
+    ORVASchedCTaskSetCommand(task.Get(), "true");
+    ASSERT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_LT(ORVASchedTaskRun(id, 0, 0), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrNoScheduler);
+    EXPECT_LT(ORVASchedTaskRun(99, 0, 0), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrNotFound);
+    EXPECT_LT(ORVASchedTaskRun(id, 1, 0), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
+
+    MakeDirectory("/run/orva");
+    const orva::FileDescriptor lock(
+        ::open((RootPath() + "/run/orva/schedd.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_EQ(::flock(lock.Get(), LOCK_EX), 0);
+    EXPECT_EQ(ORVASchedTaskRun(id, 0, 0), 0);
+}
+
+TEST_F(SchedTaskRecordsTest, WritersRefuseNullAndFlagsThatAreNeitherZeroNorOne) {
+    const Record task;
+    EXPECT_LT(ORVASchedCTaskSetApp(nullptr, "x"), 0);
+    EXPECT_LT(ORVASchedCTaskSetApp(task.Get(), nullptr), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
+    EXPECT_LT(ORVASchedCTaskSetListable(task.Get(), 2), 0);
+    EXPECT_LT(ORVASchedCTaskSetListable(task.Get(), -1), 0);
+    EXPECT_LT(ORVASchedCTaskSetState(nullptr, true), 0);
+    EXPECT_LT(ORVASchedTaskLoad(1, nullptr), 0);
+    EXPECT_LT(ORVASchedTaskSave(nullptr), 0);
+    ORVASchedTaskFree(nullptr);
+    EXPECT_TRUE(ORVASchedTaskIsListable(*task));
+}
+
+TEST_F(SchedTaskRecordsTest, ARecordDoesNotChangeWhenItsTaskDoes) {
+    const int id = SaveSample("a");
+    const Record first;
+    const Record second;
+    ASSERT_EQ(ORVASchedTaskLoad(id, first.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskLoad(id, second.Get()), 0);
+    ORVASchedCTaskSetApp(first.Get(), "changed");
+    ASSERT_EQ(ORVASchedTaskSave(first.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetApp(*second), "ORVA.ZUM.TaskScheduler.Script");
+}
+
+}  // namespace

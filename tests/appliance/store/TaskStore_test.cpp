@@ -1,0 +1,327 @@
+#include "appliance/store/TaskStore.h"
+
+#include <SQLiteCpp/SQLiteCpp.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "appliance/root/Root.h"
+#include "appliance/store/StoreFailure.h"
+#include "appliance/util/FileDescriptor.h"
+#include "tests/appliance/store/StoreTest.h"
+
+namespace {
+
+using orva::TaskData;
+using orva::TaskStore;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+class TaskStoreTest : public StoreTest {
+  protected:
+    static orva::ErrorCode CodeOf(const std::function<void()>& operation) {
+        try {
+            operation();
+        } catch (const orva::StoreFailure& failure) {
+            return failure.Code();
+        }
+        return orva::ErrorCode{};
+    }
+
+    static std::vector<int> Ids(const orva::Snapshot& snapshot) {
+        std::vector<int> ids;
+        for (const orva::SharedTask& task : snapshot.Tasks()) {
+            ids.push_back(task->id);
+        }
+        return ids;
+    }
+
+    std::string Start(int id) {
+        const auto snapshot = TaskStore::Current()->CurrentSnapshot();
+        return orva::FormatNextStart(snapshot->NextStart(*snapshot->Find(id)), snapshot->Zone());
+    }
+
+    // The one column of the one row that the query finds.
+    std::string Stored(const std::string& sql) const {
+        SQLite::Database database(DatabasePath());
+        return database.execAndGet(sql).getString();
+    }
+};
+
+TEST_F(TaskStoreTest, EverythingOfATaskComesBackAsItWasStored) {
+    TaskData task = SampleTask("N\xc3\xa4htlich \"1\"");
+    task.flags = orva::kListable | orva::kCanEditOwner | orva::kCanRunAppSameTime;
+    task.appName = "#script:script_title#";
+    task.appArgs = "{\"script\":\"x\"}\n";
+    task.action = "runs";
+    task.command = "echo 'a\nb'";
+    task.editForm = "Form";
+    task.schedule.mode = orva::Schedule::Mode::kDate;
+    task.schedule.repeat = orva::Schedule::Repeat::kHalfYearly;
+    task.schedule.weekDays = 0b101;
+    task.schedule.date = absl::CivilDay(2028, 2, 29);
+    task.schedule.intervalMinutes = 15;
+    task.schedule.lastMinute = 700;
+    task.schedule.runMissed = true;
+    task.id = TaskStore::Current()->Save(task);
+    EXPECT_EQ(task.id, 1);
+    EXPECT_EQ(*TaskStore::Current()->Find(1), task);
+    Reopen();
+    EXPECT_EQ(*TaskStore::Current()->Find(1), task);
+    EXPECT_EQ(TaskStore::Current()->CurrentSnapshot()->Task(0), task);
+}
+
+TEST_F(TaskStoreTest, SavingAgainReplacesTheTask) {
+    TaskData task = SampleTask("one");
+    task.id = TaskStore::Current()->Save(task);
+    task.name = "two";
+    EXPECT_EQ(TaskStore::Current()->Save(task), 1);
+    EXPECT_EQ(TaskStore::Current()->Find(1)->name, "two");
+    EXPECT_THAT(Ids(*TaskStore::Current()->CurrentSnapshot()), ElementsAre(1));
+}
+
+TEST_F(TaskStoreTest, AnIdIsNeverGivenTwice) {
+    TaskStore& store = *TaskStore::Current();
+    EXPECT_EQ(store.Save(SampleTask("a")), 1);
+    EXPECT_EQ(store.Save(SampleTask("b")), 2);
+    store.Remove(2);
+    EXPECT_EQ(store.Save(SampleTask("c")), 3);
+    store.Remove(3);
+    Reopen();
+    EXPECT_EQ(TaskStore::Current()->Save(SampleTask("d")), 4);
+}
+
+TEST_F(TaskStoreTest, ATaskThatIsGoneCanBeNeitherSavedNorRemovedNorFound) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData task = SampleTask("a");
+    task.id = store.Save(task);
+    store.Remove(task.id);
+    EXPECT_EQ(CodeOf([&] { store.Save(task); }), orva::kErrNotFound);
+    EXPECT_EQ(CodeOf([&] { store.Remove(task.id); }), orva::kErrNotFound);
+    EXPECT_EQ(store.Find(task.id), nullptr);
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), IsEmpty());
+}
+
+TEST_F(TaskStoreTest, TheNextStartIsStoredWhereTheSchedulerFindsIt) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData task = SampleTask("a");
+    task.id = store.Save(task);
+    EXPECT_EQ(Stored("SELECT datetime(next_start, 'unixepoch') FROM task"), "2026-05-02 06:30:00");
+    task.Set(orva::kEnabled, false);
+    store.Save(task);
+    EXPECT_EQ(Stored("SELECT next_start IS NULL FROM task"), "1");
+}
+
+TEST_F(TaskStoreTest, AnUnchangedStoreIsNotReadAgain) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    const auto first = store.CurrentSnapshot();
+    EXPECT_EQ(store.CurrentSnapshot(), first);
+    store.Find(1);
+    EXPECT_EQ(store.CurrentSnapshot(), first);
+}
+
+TEST_F(TaskStoreTest, ChangesByThisAndByOtherProcessesAreSeenAtOnce) {
+    TaskStore& store = *TaskStore::Current();
+    const auto other = OtherProcess();
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), IsEmpty());
+    other->Save(SampleTask("a"));
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(1));
+    store.Save(SampleTask("b"));
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(1, 2));
+    EXPECT_THAT(Ids(*other->CurrentSnapshot()), ElementsAre(1, 2));
+    other->Remove(1);
+    store.Save(SampleTask("c"));
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(2, 3));
+    TaskData task = *other->Find(2);
+    task.name = "B";
+    other->Save(task);
+    EXPECT_EQ(store.CurrentSnapshot()->Task(0).name, "B");
+}
+
+TEST_F(TaskStoreTest, OnlyWhatChangedIsReadAgain) {
+    TaskStore& store = *TaskStore::Current();
+    store.SaveAll({SampleTask("a"), SampleTask("b"), SampleTask("c"), SampleTask("d")});
+    const auto former = store.CurrentSnapshot();
+    const auto other = OtherProcess();
+    TaskData changed = *other->Find(2);
+    changed.name = "B";
+    other->Save(changed);
+    other->Remove(3);
+    other->Save(SampleTask("e"));
+    const auto current = store.CurrentSnapshot();
+    EXPECT_THAT(Ids(*current), ElementsAre(1, 2, 4, 5));
+    EXPECT_EQ(current->Task(1).name, "B");
+    EXPECT_EQ(current->Tasks()[0], former->Tasks()[0]);
+    EXPECT_EQ(current->Tasks()[2], former->Tasks()[3]);
+    EXPECT_EQ(former->Task(1).name, "b");
+}
+
+TEST_F(TaskStoreTest, ManyChangesAtOnceAreAllSeen) {
+    TaskStore& store = *TaskStore::Current();
+    store.SaveAll({SampleTask("a")});
+    store.CurrentSnapshot();
+    OtherProcess()->SaveAll(std::vector<TaskData>(3000, SampleTask("many")));
+    EXPECT_EQ(store.CurrentSnapshot()->Count(), 3001U);
+    OtherProcess()->SaveAll(std::vector<TaskData>(12000, SampleTask("more")));
+    EXPECT_EQ(store.CurrentSnapshot()->Count(), 15001U);
+    EXPECT_EQ(Stored("SELECT count(*) BETWEEN 10000 AND 10256 FROM task_change"), "1");
+}
+
+TEST_F(TaskStoreTest, ANextStartThatHasPassedIsComputedAnew) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    EXPECT_EQ(Start(1), "2026-05-02 06:30");
+    SetNow("2026-05-02 06:29:59");
+    const auto before = store.CurrentSnapshot();
+    EXPECT_EQ(Start(1), "2026-05-02 06:30");
+    EXPECT_EQ(store.CurrentSnapshot(), before);
+    SetNow("2026-05-02 06:30:00");
+    EXPECT_EQ(Start(1), "2026-05-03 06:30");
+    // The tasks themselves are not read again for that.
+    EXPECT_EQ(store.CurrentSnapshot()->Tasks()[0], before->Tasks()[0]);
+}
+
+TEST_F(TaskStoreTest, AClockThatIsPutBackBringsBackEarlierStarts) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    SetNow("2026-05-10 12:00:00");
+    EXPECT_EQ(Start(1), "2026-05-11 06:30");
+    SetNow("2026-05-01 00:00:00");
+    EXPECT_EQ(Start(1), "2026-05-01 06:30");
+}
+
+TEST_F(TaskStoreTest, AChangedTimeZoneChangesTheNextStarts) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    EXPECT_EQ(store.CurrentSnapshot()->NextStart(0), 1777703400);
+    ::setenv("TZ", "Asia/Kolkata", 1);
+    EXPECT_EQ(store.CurrentSnapshot()->NextStart(0), 1777703400 - 19800);
+    EXPECT_EQ(Start(1), "2026-05-02 06:30");
+}
+
+TEST_F(TaskStoreTest, SaveAllStoresAllOrNothing) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData withId = SampleTask("a");
+    withId.id = 5;
+    EXPECT_THROW(store.SaveAll({withId, withId}), orva::StoreFailure);
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), IsEmpty());
+}
+
+TEST_F(TaskStoreTest, SaveAllKeepsIdsThatWereNeverGivenAndReplacesStoredTasks) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData seven = SampleTask("seven");
+    seven.id = 7;
+    TaskData three = SampleTask("three");
+    three.id = 3;
+    store.SaveAll({SampleTask("new"), seven, three});
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(3, 7, 8));
+    EXPECT_EQ(store.Find(8)->name, "new");
+
+    store.Remove(3);
+    seven.name = "SEVEN";
+    store.SaveAll({three, seven});
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(7, 8, 9));
+    EXPECT_EQ(store.Find(7)->name, "SEVEN");
+    EXPECT_EQ(store.Find(9)->name, "three");
+}
+
+TEST_F(TaskStoreTest, WhenAllIdsAreUsedUpNothingIsStored) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData last = SampleTask("last");
+    last.id = 2147483647;
+    store.SaveAll({last});
+    EXPECT_EQ(CodeOf([&] { store.Save(SampleTask("one more")); }), orva::kErrDatabaseFull);
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(2147483647));
+}
+
+TEST_F(TaskStoreTest, ARunIsQueuedOnlyWhileASchedulerIsAlive) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    TaskData idle = SampleTask("no command");
+    idle.command.clear();
+    store.Save(idle);
+    EXPECT_EQ(CodeOf([&] { store.QueueRun(1); }), orva::kErrNoScheduler);
+    EXPECT_EQ(CodeOf([&] { store.QueueRun(2); }), orva::kErrNotAllowed);
+    EXPECT_EQ(CodeOf([&] { store.QueueRun(3); }), orva::kErrNotFound);
+    EXPECT_EQ(Stored("SELECT count(*) FROM run"), "0");
+
+    MakeDirectory("/run/orva");
+    const orva::FileDescriptor lock(
+        ::open((RootPath() + "/run/orva/schedd.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_EQ(::flock(lock.Get(), LOCK_EX), 0);
+    store.QueueRun(1);
+    store.QueueRun(1);
+    EXPECT_EQ(CodeOf([&] { store.QueueRun(2); }), orva::kErrNotAllowed);
+    EXPECT_EQ(Stored("SELECT group_concat(task || ' ' || reason || ' ' || state || ' ' || "
+                     "datetime(queued_at, 'unixepoch'), ', ') FROM run"),
+              "1 hand queued 2026-05-01 12:00:00, 1 hand queued 2026-05-01 12:00:00");
+    EXPECT_EQ(Stored("SELECT asked_program FROM run"), program_invocation_short_name);
+}
+
+TEST_F(TaskStoreTest, ARemovedTaskTakesItsQueuedRunsAlong) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    {
+        SQLite::Database database(DatabasePath(), SQLite::OPEN_READWRITE);
+        database.exec(
+            "INSERT INTO run (task, reason, state, queued_at, asked_program, "
+            "asked_account) VALUES (1, 'hand', 'queued', 0, '', ''), "
+            "(1, 'hand', 'ended', 0, '', '')");
+    }
+    store.Remove(1);
+    EXPECT_EQ(Stored("SELECT group_concat(state) FROM run"), "ended");
+}
+
+TEST_F(TaskStoreTest, AStartOfTheScheduleCanBeRecordedOnlyOnce) {
+    TaskStore::Current()->CurrentSnapshot();
+    SQLite::Database database(DatabasePath(), SQLite::OPEN_READWRITE);
+    const char* insert =
+        "INSERT INTO run (task, occurrence, reason, state, queued_at, "
+        "asked_program, asked_account) VALUES (1, 1800000000, 'schedule', "
+        "'queued', 0, '', '')";
+    EXPECT_EQ(database.exec(insert), 1);
+    EXPECT_THROW(database.exec(insert), SQLite::Exception);
+}
+
+TEST_F(TaskStoreTest, ADifferentRootIsADifferentStore) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    const std::string first = RootPath();
+    MakeDirectory("/second");
+    orva::SetRoot(first + "/second");
+    EXPECT_THAT(Ids(*TaskStore::Current()->CurrentSnapshot()), IsEmpty());
+    orva::SetRoot(first);
+    EXPECT_THAT(Ids(*TaskStore::Current()->CurrentSnapshot()), ElementsAre(1));
+}
+
+TEST_F(TaskStoreTest, ARowThatNoVersionCouldHaveWrittenIsCorruption) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    for (const char* damage : {"mode = 7", "repeat = -1", "first_minute = 1440", "week_days = 128",
+                               "date = 'soon'", "run_missed = 2"}) {
+        {
+            SQLite::Database database(DatabasePath(), SQLite::OPEN_READWRITE);
+            database.exec(std::string("UPDATE task SET ") + damage);
+        }
+        Reopen();
+        TakeLog();
+        EXPECT_EQ(CodeOf([] { TaskStore::Current()->Find(1); }), orva::kErrDatabaseCorrupt)
+            << damage;
+        EXPECT_EQ(CodeOf([] { TaskStore::Current()->CurrentSnapshot(); }),
+                  orva::kErrDatabaseCorrupt)
+            << damage;
+        const std::vector<std::string> log = TakeLog();
+        ASSERT_EQ(log.size(), 2U);
+        EXPECT_THAT(log[0], testing::HasSubstr(DatabasePath() + ": task 1: column "));
+        SQLite::Database database(DatabasePath(), SQLite::OPEN_READWRITE);
+        database.exec(
+            "UPDATE task SET mode = 0, repeat = 0, first_minute = 0, week_days = 127, "
+            "date = NULL, run_missed = 0");
+    }
+}
+
+}  // namespace

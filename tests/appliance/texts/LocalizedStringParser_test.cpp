@@ -1,0 +1,93 @@
+#include <gmock/gmock.h>
+
+#include <atomic>
+#include <filesystem>
+#include <thread>
+
+#include "platform/texts.h"
+#include "tests/appliance/util/Sandbox.h"
+
+namespace {
+
+using ORVA::ZUM::LocalizedStringParser;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr const char* kDirectory = "/usr/orva/orvaman/webman/texts/en";
+constexpr const char* kFile = "/usr/orva/orvaman/webman/texts/en/strings.json";
+
+class LocalizedStringParserTest : public Sandbox {
+  protected:
+    const LocalizedStringParser parser{};
+    const Json::Value empty{Json::objectValue};
+};
+
+TEST_F(LocalizedStringParserTest, GivesTheTextsOfADirectory) {
+    Write(kFile, R"({"common": {"run": "Run"}})");
+    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
+    EXPECT_EQ(parser.ParseTexts(std::string(kDirectory) + "/")["common"]["run"].asString(), "Run");
+}
+
+TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectWithoutADirectoryOrAFile) {
+    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    MakeDirectory(kDirectory);
+    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_THAT(TakeLog(), IsEmpty());
+}
+
+TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectForADamagedFileAndLogsItOnce) {
+    Write(kFile, R"({"common": ["run"]})");
+    for (int i = 0; i < 5; ++i) {
+        EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    }
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": section \"common\" is no object"));
+    Write(kFile, "{");
+    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
+                                       ": Line 1, Column 2 Missing '}' or object member name"));
+}
+
+TEST_F(LocalizedStringParserTest, SeesAChangedFileAtOnce) {
+    Write(kFile, R"({"common": {"run": "Run"}})");
+    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
+    Write(kFile, R"({"common": {"run": "Los"}})");
+    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Los");
+    std::filesystem::remove(RootPath() + kFile);
+    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+}
+
+TEST_F(LocalizedStringParserTest, GivesEveryCallerACopyOfItsOwn) {
+    Write(kFile, R"({"common": {"run": "Run"}})");
+    Json::Value mine = parser.ParseTexts(kDirectory);
+    mine["common"]["run"] = "changed";
+    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
+}
+
+TEST_F(LocalizedStringParserTest, ServesManyThreadsWhileTheFileChanges) {
+    Write(kFile, R"({"common": {"run": "Run"}})");
+    std::atomic<bool> stop = false;
+    std::atomic<int> wrong = 0;
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i) {
+        threads.emplace_back([&] {
+            while (!stop) {
+                const Json::Value texts = LocalizedStringParser().ParseTexts(kDirectory);
+                const std::string text = texts["common"]["run"].asString();
+                wrong += text == "Run" || text == "Start" ? 0 : 1;
+            }
+        });
+    }
+    for (int i = 0; i < 200; ++i) {
+        Write("/new.json",
+              i % 2 == 0 ? R"({"common": {"run": "Start"}})" : R"({"common": {"run": "Run"}})");
+        std::filesystem::rename(RootPath() + "/new.json", RootPath() + kFile);
+    }
+    stop = true;
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(wrong, 0);
+    EXPECT_THAT(TakeLog(), IsEmpty());
+}
+
+}  // namespace

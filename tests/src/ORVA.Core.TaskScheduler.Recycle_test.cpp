@@ -1,0 +1,706 @@
+#include "include/TaskSchedulerRecycleHandler.h"
+
+#include <algorithm>
+#include <stdexcept>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "tests/src/TypedHandlers.h"
+
+namespace fakes {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::MatchesRegex;
+
+constexpr const char* kRecycle = "ORVA.ZUM.TaskScheduler.Recycle";
+
+class RecycleTask : public PlatformTest {
+  protected:
+    void SetUp() override {
+        platform.AddTask(StoredTask(5, kRecycle, R"({"clean_all":"yes","recycle_action":"2"})"));
+        platform.shares = {"docs", "home", "it's"};
+    }
+
+    Task& Stored() { return platform.tasks[5]; }
+
+    static std::string SetForm(const std::string& extra) {
+        return Serve<TaskSchedulerRecycleHandler>("set",
+                                                  R"({"id":5,"name":"Job","extra":)" + extra + "}");
+    }
+
+    // The command of the stored flat section after a set that changes nothing in it.
+    std::string CommandOf(const std::string& flat) {
+        Stored().appArgs = flat;
+        EXPECT_EQ(SetForm("{}"), R"(success {"id":5})") << flat;
+        return Stored().command;
+    }
+
+    // The flat section that the form leaves behind.
+    std::string FlatAfter(const std::string& form) {
+        EXPECT_EQ(SetForm(form), R"(success {"id":5})") << form;
+        std::string flat = Stored().appArgs;
+        EXPECT_EQ(flat.back(), '\n');
+        flat.pop_back();
+        return flat;
+    }
+
+    // The form of the stored flat section.
+    std::string FormOf(const std::string& flat) {
+        Stored().appArgs = flat;
+        ORVA::APIRequest request = Request(R"({"id":5})");
+        ORVA::APIResponse response;
+        TaskSchedulerRecycleHandler(&request, &response).Process_v1("get");
+        EXPECT_TRUE(response.IsSuccess()) << flat;
+        return Compact(response.GetDocument()["extra"]);
+    }
+
+    std::vector<std::string> Enabled() const {
+        std::vector<std::string> calls;
+        for (const std::string& line : platform.Journal()) {
+            if (line.rfind("ORVARecycleStatusSet", 0) == 0) {
+                calls.push_back(line);
+            }
+        }
+        return calls;
+    }
+};
+
+// --- The record ----------------------------------------------------------------------------------
+
+TEST_F(RecycleTask, SetWritesEveryPropertyInItsOrderAndEnablesTheBinsBeforeItSaves) {
+    Stored().appArgs = R"({"recycle_action":"1"})";
+    EXPECT_EQ(SetForm(R"({"clean_share_policy":{"clean_all":false,"shares":["docs","it's"]},)"
+                      R"("enableRecycle":"select"})"),
+              R"(success {"id":5})");
+    EXPECT_THAT(
+        platform.Journal(),
+        ElementsAre(
+            "ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, #1)", "ORVASchedTaskFree(#1)",
+            "ORVASchedTaskAlloc()",
+            R"(ORVASchedTaskConvertFromJson_Basic({"enabled":"off","id":"5","owner":null,)"
+            R"("task_name":"Job"}, #2))",
+            R"(ORVASchedTaskConvertFromJson_Schedule({"min":null,"repeat":null,)"
+            R"("week_name":null}, #2))",
+            R"(ORVASchedCTaskSetEditForm(#2, "ORVA.ZUM.TaskScheduler.Recycle.FormPanel"))",
+            "ORVASchedCTaskSetSimpleEditForm(#2, 1)", "ORVASchedCTaskSetCanEditName(#2, 1)",
+            "ORVASchedCTaskSetCanEditOwner(#2, 0)", "ORVASchedCTaskSetCanRunAppSameTime(#2, 1)",
+            "ORVASchedCTaskSetListable(#2, 1)",
+            R"(ORVASchedCTaskSetApp(#2, "ORVA.ZUM.TaskScheduler.Recycle"))",
+            R"(ORVASchedCTaskSetAppName(#2, "#share:recycle_bin#"))",
+            R"(ORVASchedCTaskSetAppArgs(#2, "{\"clean_all\":\"no\",\"recycle_action\":\"1\",)"
+            R"(\"selected_shares\":[\"docs\",\"it's\"]}\n"))",
+            R"(QLIBCEncShParam("docs", 10))", R"(QLIBCEncShParam("it's", 10))",
+            R"(ORVASchedCTaskSetAction(#2, "#share:share_enable_recycle_bin#: \"docs\" \"it's\""))",
+            R"(ORVASchedCTaskSetCommand(#2, "/usr/orva/bin/orvarecycle --enable 'docs' 'it'\\''s'"))",
+            R"(ORVARecycleStatusSet("docs", 1))", R"(ORVARecycleStatusSet("it's", 1))",
+            "ORVASchedTaskSave(#2)", "ORVASchedTaskFree(#2)"));
+}
+
+TEST_F(RecycleTask, SetLeavesTheSameTimeFlagAsItIs) {
+    Stored().canRunTaskSameTime = true;
+    SetForm("{}");
+    EXPECT_EQ(platform.Calls("ORVASchedCTaskSetCanRunTaskSameTime"), 0);
+    EXPECT_TRUE(Stored().canRunTaskSameTime);
+}
+
+TEST_F(RecycleTask, CreateStoresATaskThatCleansAllShares) {
+    EXPECT_EQ(Serve<TaskSchedulerRecycleHandler>("set", R"({"name":"New"})"),
+              R"(success {"id":100})");
+    EXPECT_EQ(platform.tasks[100].ToText(),
+              R"(id=100, name="New", owner="admin", enabled=0, )"
+              R"(app="ORVA.ZUM.TaskScheduler.Recycle", appName="#share:recycle_bin#", )"
+              R"(appArgs="{\"clean_all\":\"yes\",\"recycle_action\":\"2\"}\n", )"
+              R"(action="#share:share_clean_all_recycle_bin#", )"
+              R"(command="/usr/orva/bin/orvarecycle --clean", )"
+              R"(editForm="ORVA.ZUM.TaskScheduler.Recycle.FormPanel", nextTriggerTime="N/A", )"
+              R"(simpleEditForm=1, canEditName=1, canEditOwner=0, canRunTaskSameTime=0, )"
+              R"(canRunAppSameTime=1, listable=1, canRunFromUI=1, canEditFromUI=1, )"
+              R"(canDeleteFromUI=1, isNew=0, schedule={"min":null,"repeat":null,)"
+              R"("week_name":null})");
+}
+
+TEST_F(RecycleTask, TheStoredActionChoosesSwitchAndText) {
+    const auto with = [](const char* action) {
+        return std::string(R"({"clean_all":"no","selected_shares":["docs"],"recycle_action":")") +
+               action + "\"}";
+    };
+    EXPECT_EQ(CommandOf(with("0")), "/usr/orva/bin/orvarecycle --disable 'docs'");
+    EXPECT_EQ(Stored().action, R"(#share:share_disable_recycle_bin#: "docs")");
+    EXPECT_EQ(CommandOf(with("1")), "/usr/orva/bin/orvarecycle --enable 'docs'");
+    EXPECT_EQ(Stored().action, R"(#share:share_enable_recycle_bin#: "docs")");
+    EXPECT_EQ(CommandOf(with("2")), "/usr/orva/bin/orvarecycle --clean 'docs'");
+    EXPECT_EQ(Stored().action, R"(#schedule:clean_recycle_bin#: "docs")");
+}
+
+TEST_F(RecycleTask, AllSharesAreMeantUnlessTheSectionSaysNo) {
+    for (const char* cleanAll : {R"("clean_all":"yes",)", R"("clean_all":"No",)",
+                                 R"("clean_all":"",)", R"("clean_all":null,)", ""}) {
+        EXPECT_EQ(CommandOf(std::string("{") + cleanAll +
+                            R"("recycle_action":"0","selected_shares":["docs"]})"),
+                  "/usr/orva/bin/orvarecycle --disable")
+            << cleanAll;
+        EXPECT_EQ(Stored().action, "#share:share_clean_all_recycle_bin#");
+    }
+}
+
+TEST_F(RecycleTask, ANameThatCannotBeQuotedLeavesAnEmptyWord) {
+    platform.FailCall("QLIBCEncShParam");
+    EXPECT_EQ(CommandOf(R"({"clean_all":"no","recycle_action":"1","selected_shares":["a","b"]})"),
+              "/usr/orva/bin/orvarecycle --enable  'b'");
+    EXPECT_EQ(Stored().action, R"(#share:share_enable_recycle_bin#: "a" "b")");
+    ASSERT_EQ(platform.Log().size(), 1U);
+    EXPECT_THAT(platform.Log()[0], MatchesRegex("lib\\.cpp:21 escape cmd=a failed, errno=.*"));
+}
+
+TEST_F(RecycleTask, SharesOfWhichNoneCanBeQuotedNeverMeanAllShares) {
+    for (const char* shares : {R"([""])", R"(["",""])"}) {
+        platform.ClearJournal();
+        Stored().appArgs =
+            std::string(R"({"clean_all":"no","recycle_action":"2","selected_shares":)") + shares +
+            "}";
+        EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Invalid (app) object"})") << shares;
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetCommand"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+    }
+}
+
+TEST_F(RecycleTask, AnUnknownActionIsLoggedAndRefusedAfterTheArgumentsAreWritten) {
+    for (const char* action : {R"("3")", R"("")", R"("clean")", "{}", "null"}) {
+        platform.ClearJournal();
+        const std::string before = std::string(R"({"recycle_action":)") + action + "}";
+        Stored().appArgs = before;
+        EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"),
+                  R"(error 117 {"msg":"Invalid (app) object"})")
+            << action;
+        ASSERT_EQ(platform.Log().size(), 2U);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAppArgs"), 1);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAppName"), 1);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAction"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetCommand"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+        EXPECT_THAT(Enabled(), IsEmpty());
+        EXPECT_EQ(Stored().appArgs, before);
+    }
+}
+
+TEST_F(RecycleTask, TheLogShowsTheRefusedSectionStyled) {
+    Stored().appArgs = R"({"recycle_action":"9"})";
+    SetForm(R"({"enableRecycle":"all"})");
+    EXPECT_THAT(platform.Log()[0],
+                MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ error "
+                             "recycle_action, json app=\\{\n\t\"recycle_action\" : \"9\"\n\\}\n"));
+}
+
+TEST_F(RecycleTask, ASelectionWithoutSharesIsLoggedAndRefused) {
+    for (const char* shares : {R"(,"selected_shares":[])", "", R"(,"selected_shares":null)",
+                               R"(,"selected_shares":"docs")", R"(,"selected_shares":{"a":"b"})"}) {
+        platform.ClearJournal();
+        Stored().appArgs = std::string(R"({"clean_all":"no","recycle_action":"2")") + shares + "}";
+        EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"),
+                  R"(error 117 {"msg":"Invalid (app) object"})")
+            << shares;
+        EXPECT_THAT(platform.Log()[0],
+                    MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ error "
+                                 "selected_shares, json app=\\{\n\t\"clean_all\" : \"no\".*"));
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAppArgs"), 1);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAction"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+        EXPECT_THAT(Enabled(), IsEmpty());
+    }
+}
+
+TEST_F(RecycleTask, ASelectionWithAnElementThatIsNoNameIsLoggedAndRefused) {
+    for (const char* element : {"5", "null", "{}", "[\"docs\"]", "true"}) {
+        platform.ClearJournal();
+        EXPECT_EQ(SetForm(std::string(R"({"clean_share_policy":{"clean_all":false,)"
+                                      R"("shares":["docs",)") +
+                          element + R"(]},"enableRecycle":"select"})"),
+                  R"(error 117 {"msg":"Invalid (app) object"})")
+            << element;
+        EXPECT_THAT(platform.Log()[0], ::testing::HasSubstr("error selected_shares, json app={"));
+        EXPECT_THAT(Enabled(), IsEmpty());
+    }
+}
+
+// --- The clean policy in the command -------------------------------------------------------------
+
+TEST_F(RecycleTask, TheTimePolicyPassesTheDaysAsTheyStand) {
+    const std::string head = R"({"recycle_action":"2","clean_policy":"clean_policy_by_time")";
+    EXPECT_EQ(CommandOf(head + R"(,"clean_policy_by_time_day":"7"})"),
+              "/usr/orva/bin/orvarecycle --clean -t 7");
+    EXPECT_EQ(CommandOf(head + R"(,"clean_policy_by_time_day":7})"),
+              "/usr/orva/bin/orvarecycle --clean -t 7");
+    EXPECT_EQ(CommandOf(head + R"(,"clean_policy_by_time_day":""})"),
+              "/usr/orva/bin/orvarecycle --clean -t ");
+    EXPECT_EQ(CommandOf(head + "}"), "/usr/orva/bin/orvarecycle --clean -t ");
+}
+
+TEST_F(RecycleTask, TheSizePolicyPassesBytesAndTheOrderOfDeletion) {
+    const auto with = [](const std::string& sortType) {
+        return R"({"recycle_action":"2","clean_policy":"clean_policy_by_size",)"
+               R"("clean_policy_by_size_MB_number":"3")" +
+               sortType + "}";
+    };
+    EXPECT_EQ(CommandOf(with(R"(,"clean_policy_by_size_sort_type":"Delete large files first")")),
+              "/usr/orva/bin/orvarecycle --clean -s 3145728 -o 2");
+    EXPECT_EQ(CommandOf(with(R"(,"clean_policy_by_size_sort_type":"Delete old files first")")),
+              "/usr/orva/bin/orvarecycle --clean -s 3145728 -o 1");
+    EXPECT_EQ(CommandOf(with("")), "/usr/orva/bin/orvarecycle --clean -s 3145728 -o 1");
+}
+
+TEST_F(RecycleTask, BytesAreThoseOfSigned32BitArithmeticWidened) {
+    const std::vector<std::pair<std::string, std::string>> cases = {
+        {R"("0")", "0"},
+        {R"("1")", "1048576"},
+        {R"("100")", "104857600"},
+        {R"("2047")", "2146435072"},
+        {R"("2048")", "18446744071562067968"},
+        {R"("4095")", "18446744073708503040"},
+        {R"("4096")", "0"},
+        {R"("4097")", "1048576"},
+        {R"("-1")", "18446744073708503040"},
+        {R"("12abc")", "12582912"},
+        {R"(" +12")", "12582912"},
+        {R"("abc")", "0"},
+        {R"("")", "0"},
+        {"null", "0"},
+        {"12", "12582912"},
+        {R"("99999999999999999999")", "18446744073708503040"},
+        {R"("-99999999999999999999")", "0"},
+        {"{}", "0"},
+    };
+    for (const auto& [megabytes, bytes] : cases) {
+        EXPECT_EQ(CommandOf(R"({"recycle_action":"2","clean_policy":"clean_policy_by_size",)"
+                            R"("clean_policy_by_size_MB_number":)" +
+                            megabytes + "}"),
+                  "/usr/orva/bin/orvarecycle --clean -s " + bytes + " -o 1")
+            << megabytes;
+    }
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","clean_policy":"clean_policy_by_size"})"),
+              "/usr/orva/bin/orvarecycle --clean -s 0 -o 1");
+}
+
+TEST_F(RecycleTask, KeepRulesFollowThePolicyInTheirOrder) {
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","clean_policy":"clean_policy_by_time",)"
+                        R"("clean_policy_by_time_day":"30","advconfig":{)"
+                        R"("reserve_policy_size_smaller_check":"on",)"
+                        R"("reserve_policy_size_smaller":"2",)"
+                        R"("reserve_policy_size_greater_check":"on",)"
+                        R"("reserve_policy_size_greater":"100",)"
+                        R"("reserve_policy_extension_check":"on",)"
+                        R"("reserve_policy_extension":[{"file_ext":"doc"},{"file_ext":"jpg"}]}})"),
+              "/usr/orva/bin/orvarecycle --clean -t 30 -file_ext=\"doc.jpg\" -m 104857600 "
+              "-l 2097152");
+}
+
+TEST_F(RecycleTask, AKeepRuleCountsOnlyWhenItsCheckIsOn) {
+    for (const char* check : {R"("off")", R"("ON")", R"("")", "true", "null", "[]"}) {
+        EXPECT_EQ(CommandOf(std::string(R"({"recycle_action":"2","advconfig":{)"
+                                        R"("reserve_policy_size_smaller":"2",)"
+                                        R"("reserve_policy_size_greater":"3",)"
+                                        R"("reserve_policy_extension":[{"file_ext":"doc"}],)"
+                                        R"("reserve_policy_size_smaller_check":)") +
+                            check + R"(,"reserve_policy_size_greater_check":)" + check +
+                            R"(,"reserve_policy_extension_check":)" + check + "}}"),
+                  "/usr/orva/bin/orvarecycle --clean")
+            << check;
+    }
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","advconfig":{)"
+                        R"("reserve_policy_size_greater_check":"on"}})"),
+              "/usr/orva/bin/orvarecycle --clean -m 0");
+}
+
+TEST_F(RecycleTask, ExtensionsNeedAListWithElements) {
+    const auto with = [](const std::string& extensions) {
+        return R"({"recycle_action":"2","advconfig":{"reserve_policy_extension_check":"on")" +
+               extensions + "}}";
+    };
+    for (const char* extensions :
+         {"", R"(,"reserve_policy_extension":[])", R"(,"reserve_policy_extension":"doc")",
+          R"(,"reserve_policy_extension":{"file_ext":"doc"})"}) {
+        EXPECT_EQ(CommandOf(with(extensions)), "/usr/orva/bin/orvarecycle --clean") << extensions;
+    }
+}
+
+TEST_F(RecycleTask, ExtensionsThatAreNoTextArePassedOver) {
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","advconfig":{)"
+                        R"("reserve_policy_extension_check":"on","reserve_policy_extension":)"
+                        R"(["x",5,null,[1],{"file_ext":"a"},{"file_ext":{}},{},{"file_ext":""},)"
+                        R"({"file_ext":"b"}]}})"),
+              "/usr/orva/bin/orvarecycle --clean -file_ext=\"a..b\"");
+}
+
+TEST_F(RecycleTask, ExtensionsGoIntoTheCommandAsTheyStand) {
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","advconfig":{)"
+                        R"("reserve_policy_extension_check":"on",)"
+                        R"("reserve_policy_extension":[{"file_ext":"$(id)\" `x` '"}]}})"),
+              "/usr/orva/bin/orvarecycle --clean -file_ext=\"$(id)\" `x` '\"");
+}
+
+TEST_F(RecycleTask, PolicySwitchesBelongToCleaningOnly) {
+    const std::string tail =
+        R"(,"clean_policy":"clean_policy_by_time","clean_policy_by_time_day":"7",)"
+        R"("advconfig":{"reserve_policy_size_greater_check":"on"}})";
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"0")" + tail), "/usr/orva/bin/orvarecycle --disable");
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"1")" + tail), "/usr/orva/bin/orvarecycle --enable");
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2")" + tail),
+              "/usr/orva/bin/orvarecycle --clean -t 7 -m 0");
+}
+
+TEST_F(RecycleTask, OtherPoliciesAddNoSwitch) {
+    for (const char* policy : {R"("clean_policy_default")", R"("else")", "null", "[]"}) {
+        EXPECT_EQ(CommandOf(std::string(R"({"recycle_action":"2","clean_policy_by_time_day":"7",)"
+                                        R"("clean_policy":)") +
+                            policy + "}"),
+                  "/usr/orva/bin/orvarecycle --clean");
+    }
+}
+
+// --- From the form to the flat section -----------------------------------------------------------
+
+TEST_F(RecycleTask, SetLaysTheWholeFormOverTheStoredSection) {
+    EXPECT_EQ(FlatAfter(R"({"clean_share_policy":{"clean_all":false,"shares":["docs"]},)"
+                        R"("clean_file_policy":{"policy":"size","size":12,"sort_type":1,)"
+                        R"("reserve_policy":{"size_greater_check":true,"size_greater":3,)"
+                        R"("size_smaller_check":true,"size_smaller":4,"extension_check":true,)"
+                        R"("extension":[{"file_ext":"doc","more":1}]}}})"),
+              R"({"advconfig":{"reserve_policy_extension":[{"file_ext":"doc","more":1}],)"
+              R"("reserve_policy_extension_check":"on","reserve_policy_size_greater":"3",)"
+              R"("reserve_policy_size_greater_check":"on","reserve_policy_size_smaller":"4",)"
+              R"("reserve_policy_size_smaller_check":"on"},"clean_all":"no",)"
+              R"("clean_policy":"clean_policy_by_size","clean_policy_by_size_MB_number":"12",)"
+              R"("clean_policy_by_size_sort_type":"Delete old files first",)"
+              R"("recycle_action":"2","selected_shares":["docs"]})");
+}
+
+constexpr const char* kFullFlat =
+    R"({"advconfig":{"reserve_policy_extension":[{"file_ext":"doc"}],)"
+    R"("reserve_policy_extension_check":"on","reserve_policy_size_greater":"3",)"
+    R"("reserve_policy_size_greater_check":"on","reserve_policy_size_smaller":"4",)"
+    R"("reserve_policy_size_smaller_check":"on"},"clean_all":"no",)"
+    R"("clean_policy":"clean_policy_by_size","clean_policy_by_size_MB_number":"12",)"
+    R"("clean_policy_by_size_sort_type":"Delete old files first","clean_policy_by_time_day":"9",)"
+    R"("mine":1,"recycle_action":"1","selected_shares":["docs"]})";
+
+TEST_F(RecycleTask, WhatTheFormLeavesOutKeepsItsValue) {
+    for (const char* form :
+         {"{}", "null", R"({"clean_share_policy":{},"clean_file_policy":{}})",
+          R"({"clean_share_policy":5,"clean_file_policy":[1]})",
+          R"({"clean_file_policy":{"reserve_policy":{}}})",
+          R"({"clean_file_policy":{"reserve_policy":"x","policy":5}})", R"({"recycle_action":"0"})",
+          R"({"clean_file_policy":{"size":77,"sort_type":0,"time":77}})"}) {
+        Stored().appArgs = kFullFlat;
+        EXPECT_EQ(FlatAfter(form), kFullFlat) << form;
+    }
+}
+
+TEST_F(RecycleTask, WhatTheFormSendsWithAnotherTypeKeepsItsValue) {
+    for (const char* form :
+         {R"({"clean_share_policy":{"clean_all":"yes","shares":"docs"}})",
+          R"({"clean_share_policy":{"clean_all":1,"shares":{"a":"b"}}})",
+          R"({"clean_file_policy":{"policy":"size","size":"13","sort_type":"0"}})",
+          R"({"clean_file_policy":{"policy":"size","size":13.0,"sort_type":0.0}})",
+          R"({"clean_file_policy":{"policy":"size","size":4294967296,"sort_type":true}})",
+          R"({"clean_file_policy":{"reserve_policy":{"size_greater_check":"off",)"
+          R"("size_smaller_check":0,"extension_check":null}}})",
+          R"({"clean_file_policy":{"reserve_policy":{"size_greater_check":true,)"
+          R"("size_greater":"9","size_smaller_check":true,"size_smaller":null,)"
+          R"("extension_check":true,"extension":"jpg"}}})",
+          R"({"clean_file_policy":{"reserve_policy":{"size_greater":9,"size_smaller":9,)"
+          R"("extension":[]}}})"}) {
+        Stored().appArgs = kFullFlat;
+        EXPECT_EQ(FlatAfter(form), kFullFlat) << form;
+    }
+}
+
+TEST_F(RecycleTask, ACheckThatIsOffLeavesItsStoredValueInPlace) {
+    Stored().appArgs = kFullFlat;
+    EXPECT_EQ(FlatAfter(R"({"clean_file_policy":{"reserve_policy":{"size_greater_check":false,)"
+                        R"("size_greater":9,"size_smaller_check":false,"size_smaller":9,)"
+                        R"("extension_check":false,"extension":[]}}})"),
+              R"({"advconfig":{"reserve_policy_extension":[{"file_ext":"doc"}],)"
+              R"("reserve_policy_extension_check":"off","reserve_policy_size_greater":"3",)"
+              R"("reserve_policy_size_greater_check":"off","reserve_policy_size_smaller":"4",)"
+              R"("reserve_policy_size_smaller_check":"off"},"clean_all":"no",)"
+              R"("clean_policy":"clean_policy_by_size","clean_policy_by_size_MB_number":"12",)"
+              R"("clean_policy_by_size_sort_type":"Delete old files first",)"
+              R"("clean_policy_by_time_day":"9","mine":1,"recycle_action":"1",)"
+              R"("selected_shares":["docs"]})");
+}
+
+TEST_F(RecycleTask, EachPolicyOfTheFormHasItsStoredWord) {
+    const auto policy = [&](const char* file) {
+        Stored().appArgs = R"({"recycle_action":"2"})";
+        return FlatAfter(std::string(R"({"clean_file_policy":)") + file + "}");
+    };
+    EXPECT_EQ(policy(R"({"policy":"time","time":14,"size":3})"),
+              R"({"clean_policy":"clean_policy_by_time","clean_policy_by_time_day":"14",)"
+              R"("recycle_action":"2"})");
+    EXPECT_EQ(policy(R"({"policy":"size","size":-3,"time":14,"sort_type":0})"),
+              R"({"clean_policy":"clean_policy_by_size","clean_policy_by_size_MB_number":"-3",)"
+              R"("clean_policy_by_size_sort_type":"Delete large files first",)"
+              R"("recycle_action":"2"})");
+    EXPECT_EQ(policy(R"({"policy":"clean_all","time":14})"),
+              R"({"clean_policy":"clean_policy_default","recycle_action":"2"})");
+    EXPECT_EQ(policy(R"({"policy":""})"),
+              R"({"clean_policy":"clean_policy_default","recycle_action":"2"})");
+}
+
+TEST_F(RecycleTask, TheWishToEnableBinsIsNeverStored) {
+    EXPECT_EQ(FlatAfter(R"({"enableRecycle":"select"})"),
+              R"({"clean_all":"yes","recycle_action":"2"})");
+    EXPECT_EQ(FlatAfter(R"({"enableRecycle":null})"),
+              R"({"clean_all":"yes","recycle_action":"2"})");
+}
+
+TEST_F(RecycleTask, DamagedStoredSectionsGiveWayToTheForm) {
+    for (const char* stored : {"[1]", "5", "\"text\"", "not json", ""}) {
+        Stored().appArgs = stored;
+        EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Invalid (app) object"})") << stored;
+    }
+    Stored().appArgs = R"({"recycle_action":"2","advconfig":"x"})";
+    EXPECT_EQ(FlatAfter(R"({"clean_file_policy":{"reserve_policy":{"extension_check":false}}})"),
+              R"({"advconfig":{"reserve_policy_extension_check":"off"},"recycle_action":"2"})");
+}
+
+TEST_F(RecycleTask, AFormThatIsNoObjectEndsAsAnExceptionWithNothingSaved) {
+    for (const char* form : {"5", "[1]", "\"x\"", "true"}) {
+        EXPECT_THROW(SetForm(form), Json::LogicError) << form;
+    }
+    EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+}
+
+TEST_F(RecycleTask, SetAnswersWhatKeptTheStoredSectionAway) {
+    platform.FailCall("ORVASchedTaskAlloc");
+    EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Failed to allocate task"})");
+    platform.FailCall("ORVASchedTaskLoad");
+    EXPECT_EQ(SetForm("{}"), R"(error 4801 {"msg":"Failed to load task"})");
+    ORVA::APIRequest request = Request(R"({"id":99})");
+    ORVA::APIResponse response;
+    Json::Value app = "unchanged";
+    EXPECT_FALSE(TaskSchedulerRecycleHandler(&request, &response).ReConstructJsonSet_App(app));
+    EXPECT_EQ(Compact(app), R"("unchanged")");
+}
+
+// --- From the flat section to the form -----------------------------------------------------------
+
+TEST_F(RecycleTask, GetShowsTheWholeSectionAsTheForm) {
+    EXPECT_EQ(FormOf(kFullFlat),
+              R"({"clean_file_policy":{"policy":"size","reserve_policy":{)"
+              R"("extension":[{"file_ext":"doc"}],"extension_check":true,"size_greater":3,)"
+              R"("size_greater_check":true,"size_smaller":4,"size_smaller_check":true},)"
+              R"("size":12,"sort_type":1},)"
+              R"("clean_share_policy":{"clean_all":false,"shares":["docs"]},"mine":1})");
+}
+
+TEST_F(RecycleTask, ANewTaskShowsTheBlankForm) {
+    EXPECT_EQ(Serve<TaskSchedulerRecycleHandler>("get", R"({"id":-1,"type":"recycle"})"),
+              R"(success {"action":"","can_edit_name":true,"can_edit_owner":false,"enable":true,)"
+              R"("extra":{"clean_file_policy":{"policy":"clean_all","reserve_policy":{)"
+              R"("extension_check":false,"size_greater_check":false,"size_smaller_check":false}},)"
+              R"("clean_share_policy":{"clean_all":true,"shares":null}},"id":-1,"name":"",)"
+              R"("owner":"admin",)"
+              R"("schedule":{"minute":null,"repeat_date":null,"week_day":null},)"
+              R"("type":"custom"})");
+}
+
+TEST_F(RecycleTask, ANewTaskHoldsTheActionCleanForAllShares) {
+    ORVA::APIRequest request = Request("{}");
+    ORVA::APIResponse response;
+    Json::Value app;
+    EXPECT_TRUE(TaskSchedulerRecycleHandler(&request, &response).GetOriginAppObj(app));
+    EXPECT_EQ(Compact(app), R"({"clean_all":"yes","recycle_action":"2"})");
+}
+
+TEST_F(RecycleTask, GetShowsTheTimePolicy) {
+    EXPECT_EQ(FormOf(R"({"clean_policy":"clean_policy_by_time","clean_policy_by_time_day":"14x",)"
+                     R"("clean_policy_by_size_MB_number":"3"})"),
+              R"({"clean_file_policy":{"policy":"time","reserve_policy":{)"
+              R"("extension_check":false,"size_greater_check":false,"size_smaller_check":false},)"
+              R"("time":14},"clean_share_policy":{"clean_all":false,"shares":null}})");
+}
+
+TEST_F(RecycleTask, TheDefaultPolicyReadsAsCleanAllAndIsWrittenBackAsTheDefault) {
+    const std::string flat =
+        R"({"advconfig":{"reserve_policy_extension_check":"off",)"
+        R"("reserve_policy_size_greater_check":"off","reserve_policy_size_smaller_check":"off"},)"
+        R"("clean_all":"yes","clean_policy":"clean_policy_default","recycle_action":"2"})";
+    const std::string form = FormOf(flat);
+    EXPECT_EQ(form, R"({"clean_file_policy":{"policy":"clean_all","reserve_policy":{)"
+                    R"("extension_check":false,"size_greater_check":false,)"
+                    R"("size_smaller_check":false}},)"
+                    R"("clean_share_policy":{"clean_all":true,"shares":null}})");
+    EXPECT_EQ(FlatAfter(form), flat);
+}
+
+TEST_F(RecycleTask, ASortTypeBeyondTheTwoIsWrittenAsLargeFirstAndReadBackAsZero) {
+    EXPECT_THAT(FlatAfter(R"({"clean_file_policy":{"policy":"size","size":1,"sort_type":2}})"),
+                ::testing::HasSubstr("Delete large files first"));
+    EXPECT_THAT(FormOf(Stored().appArgs), ::testing::HasSubstr(R"("sort_type":0)"));
+}
+
+TEST_F(RecycleTask, GetHidesTheActionAndALaterSetKeepsIt) {
+    Stored().appArgs = R"({"clean_all":"yes","recycle_action":"1"})";
+    const std::string form = FormOf(Stored().appArgs);
+    EXPECT_EQ(form.find("recycle_action"), std::string::npos);
+    EXPECT_THAT(FlatAfter(form), ::testing::HasSubstr(R"("recycle_action":"1")"));
+    EXPECT_EQ(Stored().command, "/usr/orva/bin/orvarecycle --enable");
+}
+
+TEST_F(RecycleTask, GetReadsNumbersAsTheirLeadingDigits) {
+    const auto size = [&](const std::string& megabytes) {
+        const Json::Value form = Document(FormOf(R"({"clean_policy":"clean_policy_by_size",)"
+                                                 R"("clean_policy_by_size_MB_number":)" +
+                                                 megabytes + "}"));
+        return Compact(form["clean_file_policy"]["size"]);
+    };
+    EXPECT_EQ(size(R"("12abc")"), "12");
+    EXPECT_EQ(size(R"("-7")"), "-7");
+    EXPECT_EQ(size(R"("")"), "0");
+    EXPECT_EQ(size("null"), "0");
+    EXPECT_EQ(size("15"), "15");
+    EXPECT_EQ(size("[]"), "0");
+    EXPECT_EQ(size(R"("99999999999999999999")"), "9223372036854775807");
+}
+
+TEST_F(RecycleTask, GetOfADamagedSectionShowsAFormWithoutValues) {
+    const std::string blank =
+        R"({"clean_file_policy":{"policy":"clean_all","reserve_policy":{)"
+        R"("extension_check":false,"size_greater_check":false,"size_smaller_check":false}},)"
+        R"("clean_share_policy":{"clean_all":false,"shares":null}})";
+    for (const char* stored : {"", "not json", "[1]", "5", R"({"advconfig":[1]})",
+                               R"({"advconfig":"x","clean_policy":{},"clean_all":[]})",
+                               R"({"clean_share_policy":5,"clean_file_policy":[5]})"}) {
+        EXPECT_EQ(FormOf(stored), blank) << stored;
+    }
+}
+
+TEST_F(RecycleTask, AKeepRuleThatIsOnWithoutItsValueShowsZeroAndNull) {
+    EXPECT_THAT(FormOf(R"({"advconfig":{"reserve_policy_size_greater_check":"on",)"
+                       R"("reserve_policy_extension_check":"on"}})"),
+                ::testing::HasSubstr(
+                    R"("reserve_policy":{"extension":null,"extension_check":true,)"
+                    R"("size_greater":0,"size_greater_check":true,"size_smaller_check":false})"));
+}
+
+// --- Enabling recycle bins -----------------------------------------------------------------------
+
+TEST_F(RecycleTask, SelectWithoutSharesEnablesNothingAndSucceeds) {
+    EXPECT_EQ(SetForm(R"({"enableRecycle":"select","clean_share_policy":{"shares":["docs"]}})"),
+              R"(success {"id":5})");
+    EXPECT_THAT(Enabled(), IsEmpty());
+    EXPECT_EQ(platform.Calls("ORVAShareEnum"), 0);
+}
+
+TEST_F(RecycleTask, AnyOtherWishEnablesEveryShareInListOrder) {
+    for (const char* wish : {R"("all")", R"("")", R"("Select")", "true", "1"}) {
+        platform.ClearJournal();
+        EXPECT_EQ(SetForm(std::string(R"({"enableRecycle":)") + wish + "}"), R"(success {"id":5})");
+        EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
+                                           R"(ORVARecycleStatusSet("home", 1))",
+                                           R"(ORVARecycleStatusSet("it's", 1))"))
+            << wish;
+    }
+}
+
+TEST_F(RecycleTask, AllIncludeHomeEnablesEveryShareAndThenHome) {
+    platform.shares = {"docs", "video"};
+    SetForm(R"({"enableRecycle":"all_include_home"})");
+    const std::vector<std::string> journal = platform.Journal();
+    const auto from = std::find(journal.begin(), journal.end(), "QLIBCSzListAlloc(100)");
+    EXPECT_THAT(
+        std::vector<std::string>(from, journal.end()),
+        ElementsAre("QLIBCSzListAlloc(100)", "ORVAShareEnum(#1, 783)", "QLIBCSzListFree(#1)",
+                    R"(ORVARecycleStatusSet("docs", 1))", R"(ORVARecycleStatusSet("video", 1))",
+                    R"(ORVARecycleStatusSet("home", 1))", ::testing::HasSubstr("LOG_ERR"),
+                    "ORVASchedTaskSave(#2)", "ORVASchedTaskFree(#2)"));
+}
+
+TEST_F(RecycleTask, WithoutAnyShareOnlyHomeIsEnabled) {
+    platform.shares.clear();
+    SetForm(R"({"enableRecycle":"all_include_home"})");
+    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("home", 1))"));
+}
+
+TEST_F(RecycleTask, AShareThatCannotBeEnabledIsLoggedAndTheNextOnesFollow) {
+    platform.FailCall("ORVARecycleStatusSet", 2);
+    EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"), R"(success {"id":5})");
+    EXPECT_EQ(Enabled().size(), 3U);
+    ASSERT_EQ(platform.Log().size(), 1U);
+    EXPECT_THAT(platform.Log()[0],
+                MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ enable share=home "
+                             "recycle bin failed"));
+}
+
+TEST_F(RecycleTask, WithoutMemoryForTheSharesTheTaskIsSavedAllTheSame) {
+    platform.FailCall("QLIBCSzListAlloc");
+    EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"), R"(success {"id":5})");
+    ASSERT_EQ(platform.Log().size(), 1U);
+    EXPECT_THAT(platform.Log()[0],
+                MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ malloc failed"));
+    EXPECT_THAT(Enabled(), IsEmpty());
+}
+
+TEST_F(RecycleTask, WithoutTheListOfSharesTheTaskIsSavedAllTheSame) {
+    platform.FailCall("ORVAShareEnum");
+    EXPECT_EQ(SetForm(R"({"enableRecycle":"all_include_home"})"), R"(success {"id":5})");
+    const std::vector<std::string> journal = platform.Journal();
+    const auto from = std::find(journal.begin(), journal.end(), "QLIBCSzListAlloc(100)");
+    EXPECT_THAT(
+        std::vector<std::string>(from, journal.end()),
+        ElementsAre("QLIBCSzListAlloc(100)", "ORVAShareEnum(#1, 783)",
+                    MatchesRegex("LOG_ERR ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ enum "
+                                 "share failed"),
+                    "QLIBCSzListFree(#1)", "ORVASchedTaskSave(#2)", "ORVASchedTaskFree(#2)"));
+}
+
+TEST_F(RecycleTask, ANameMissingFromTheListIsPassedOver) {
+    platform.FailCall("QLIBCSzListGet", 2);
+    SetForm(R"({"enableRecycle":"all"})");
+    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
+                                       R"(ORVARecycleStatusSet("it's", 1))"));
+}
+
+TEST_F(RecycleTask, EnablingReportsWhetherTheListOfSharesCouldBeHad) {
+    ORVA::APIRequest request = Request("{}");
+    ORVA::APIResponse response;
+    TaskSchedulerRecycleHandler handler(&request, &response);
+    EXPECT_TRUE(handler.EnableRecycleBin(Document(R"(["docs",5,"none"])"), "select"));
+    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
+                                       R"(ORVARecycleStatusSet("none", 1))"));
+    EXPECT_TRUE(handler.EnableRecycleBin(Json::Value(), "all"));
+    platform.FailCall("QLIBCSzListAlloc");
+    EXPECT_FALSE(handler.EnableRecycleBin(Json::Value(), "all"));
+    platform.FailCall("ORVAShareEnum");
+    EXPECT_FALSE(handler.EnableRecycleBin(Json::Value(), "all"));
+}
+
+TEST_F(RecycleTask, AWishThatIsNoTextEndsAsAnExceptionWithNothingEnabledOrSaved) {
+    for (const char* wish : {"{}", "[\"select\"]"}) {
+        EXPECT_THROW(SetForm(std::string(R"({"enableRecycle":)") + wish + "}"), Json::LogicError);
+    }
+    EXPECT_THAT(Enabled(), IsEmpty());
+    EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+}
+
+TEST_F(RecycleTask, AFailedSaveLeavesTheBinsEnabled) {
+    platform.FailCall("ORVASchedTaskSave");
+    EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"), R"(error 117 {"msg":"Failed to save task"})");
+    EXPECT_EQ(Enabled().size(), 3U);
+}
+
+TEST_F(RecycleTask, AnExceptionFromThePlatformFreesRecordsAndLists) {
+    for (const char* function : {"ORVAShareEnum", "QLIBCSzListGet", "ORVARecycleStatusSet",
+                                 "ORVASchedCTaskSetAppArgs", "ORVASchedTaskGetAppArgs"}) {
+        platform.ThrowFrom(function);
+        EXPECT_THROW(SetForm(R"({"enableRecycle":"all"})"), std::runtime_error) << function;
+        EXPECT_EQ(platform.Leftovers(), "") << function;
+    }
+}
+
+}  // namespace
+}  // namespace fakes
