@@ -1,0 +1,46 @@
+#pragma once
+
+#include <json/value.h>
+
+#include <filesystem>
+#include <memory>
+#include <string>
+
+#include "appliance/webapi/ApiCatalogue.h"
+#include "appliance/webapi/ModuleLoader.h"
+#include "platform/webapi.h"
+
+namespace orva {
+
+// A root of its own in the directory that the environment's ORVA_BENCH_DIR names (default: the
+// working directory, since a memory file system would make durable writes look free), with a given
+// number of tasks and a catalogue of 500 texts; and the module, loaded as the server loads it.
+class BenchAppliance {
+  public:
+    explicit BenchAppliance(int taskCount);
+    ~BenchAppliance();
+    BenchAppliance(const BenchAppliance&) = delete;
+    BenchAppliance& operator=(const BenchAppliance&) = delete;
+
+    // Calls a method of the task scheduler's API in this process; ends the program when it fails.
+    ORVA::APIResponse Call(const char* method, const Json::Value& parameters) const;
+
+    std::filesystem::path Root() const { return root; }
+    std::filesystem::path Database() const;
+
+    // An id that no earlier call gave.
+    int NextId() { return ++lastId; }
+
+  private:
+    std::filesystem::path root;
+    std::unique_ptr<ModuleLoader> modules;
+    int lastId = 0;
+};
+
+// Parses a parameter document of this program's own.
+Json::Value Parameters(const char* text);
+
+// Prints the message and ends the program unless the condition holds.
+void Require(bool condition, const std::string& message);
+
+}  // namespace orva

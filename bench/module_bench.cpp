@@ -1,0 +1,204 @@
+// The module's speed as its callers meet it: through the method table of the real shared object, on
+// the real store. Rows named "floor" measure what the rows above them cannot do without.
+#include "bench/ModuleBench.h"
+
+#include <SQLiteCpp/Database.h>
+#include <SQLiteCpp/Statement.h>
+#include <benchmark/benchmark.h>
+#include <json/writer.h>
+
+#include <string>
+
+#include "appliance/webapi/ApiAnswer.h"
+#include "appliance/webapi/JsonWriter.h"
+
+namespace orva {
+namespace {
+
+constexpr int kTasks = 10'000;
+constexpr int kManyTasks = 100'000;
+constexpr const char* kPage = R"({"sort_by":"name","offset":4000,"limit":50})";
+
+BenchAppliance& Appliance() {
+    static BenchAppliance appliance(kTasks);
+    return appliance;
+}
+
+void FrameOfARequest(benchmark::State& state) {
+    const BenchAppliance& appliance = Appliance();
+    const Json::Value parameters = Parameters(R"({"task":[]})");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(appliance.Call("delete", parameters));
+    }
+}
+BENCHMARK(FrameOfARequest)->Unit(benchmark::kMicrosecond);
+
+void PageOf50(benchmark::State& state) {
+    const BenchAppliance& appliance = Appliance();
+    const Json::Value parameters = Parameters(kPage);
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(appliance.Call("list", parameters));
+    }
+}
+BENCHMARK(PageOf50)->Unit(benchmark::kMicrosecond);
+
+// Another connection stands for another process: the store sees both by the same sign.
+void PageOf50AfterAnotherProcessWrote(benchmark::State& state) {
+    const BenchAppliance& appliance = Appliance();
+    const Json::Value parameters = Parameters(kPage);
+    SQLite::Database other(appliance.Database().string(), SQLite::OPEN_READWRITE);
+    other.exec("PRAGMA synchronous=OFF");
+    SQLite::Statement change(other, "UPDATE task SET name = 'Task ' || ? WHERE id = ?");
+    SQLite::Statement note(other,
+                           "INSERT INTO task_change (number, task)"
+                           " SELECT coalesce(max(number), 0) + 1, ? FROM task_change");
+    int round = 0;
+    for (auto _ : state) {
+        state.PauseTiming();
+        ++round;
+        const int id = round % kTasks + 1;
+        other.exec("BEGIN IMMEDIATE");
+        change.bind(1, kTasks + round);
+        change.bind(2, id);
+        change.exec();
+        change.reset();
+        note.bind(1, id);
+        note.exec();
+        note.reset();
+        other.exec("COMMIT");
+        state.ResumeTiming();
+        benchmark::DoNotOptimize(appliance.Call("list", parameters));
+    }
+}
+BENCHMARK(PageOf50AfterAnotherProcessWrote)->Unit(benchmark::kMicrosecond);
+
+void WholeListAndItsText(benchmark::State& state) {
+    const BenchAppliance& appliance = Appliance();
+    const Json::Value parameters = Parameters("{}");
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(WriteAnswer(appliance.Call("list", parameters)));
+    }
+}
+BENCHMARK(WholeListAndItsText)->Unit(benchmark::kMillisecond);
+
+// The same document, built member by member and written by jsoncpp.
+void WholeListAndItsText_floor(benchmark::State& state) {
+    const Json::Value list = Appliance().Call("list", Parameters("{}")).GetDocument();
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    builder["emitUTF8"] = true;
+    for (auto _ : state) {
+        Json::Value answer(Json::objectValue);
+        Json::Value& data = answer["data"];
+        Json::Value& rows = data["tasks"] = Json::Value(Json::arrayValue);
+        for (const Json::Value& row : list["tasks"]) {
+            Json::Value copy(Json::objectValue);
+            for (const char* name : {"enable", "can_run", "can_delete", "can_edit"}) {
+                copy[name] = row[name].asBool();
+            }
+            copy["id"] = row["id"].asInt();
+            for (const char* name : {"name", "type", "action", "next_trigger_time"}) {
+                copy[name] = row[name].asCString();
+            }
+            rows.append(std::move(copy));
+        }
+        data["total"] = list["total"];
+        answer["success"] = true;
+        benchmark::DoNotOptimize(Json::writeString(builder, answer));
+    }
+}
+BENCHMARK(WholeListAndItsText_floor)->Unit(benchmark::kMillisecond);
+
+// A copy of the database under SQLite alone, with the store's durability.
+SQLite::Database& RawDatabase() {
+    static SQLite::Database raw = [] {
+        const std::string path = (Appliance().Root() / "raw.db").string();
+        SQLite::Database(Appliance().Database().string(), SQLite::OPEN_READONLY)
+            .exec("VACUUM INTO '" + path + "'");
+        SQLite::Database database(path, SQLite::OPEN_READWRITE);
+        database.exec("PRAGMA journal_mode=WAL; PRAGMA synchronous=FULL");
+        return database;
+    }();
+    return raw;
+}
+
+void SetEnable(benchmark::State& state) {
+    const BenchAppliance& appliance = Appliance();
+    Json::Value parameters = Parameters(R"({"status":[{"id":1,"enable":true}]})");
+    int round = 0;
+    for (auto _ : state) {
+        Json::Value& status = parameters["status"][0];
+        status["id"] = ++round % kTasks + 1;
+        status["enable"] = round % 2 == 0;
+        benchmark::DoNotOptimize(appliance.Call("set_enable", parameters));
+    }
+}
+BENCHMARK(SetEnable)->Unit(benchmark::kMicrosecond)->MinTime(2);
+
+void SetEnable_floor(benchmark::State& state) {
+    SQLite::Database& raw = RawDatabase();
+    SQLite::Statement begin(raw, "BEGIN IMMEDIATE");
+    SQLite::Statement commit(raw, "COMMIT");
+    SQLite::Statement update(
+        raw,
+        "UPDATE task SET flags = ?, name = name || '', app_args = app_args || '',"
+        " next_start = coalesce(next_start, 0) + 60 WHERE id = ?");
+    int round = 0;
+    for (auto _ : state) {
+        begin.exec();
+        begin.reset();
+        update.bind(1, ++round);
+        update.bind(2, round % kTasks + 1);
+        update.exec();
+        update.reset();
+        commit.exec();
+        commit.reset();
+    }
+}
+BENCHMARK(SetEnable_floor)->Unit(benchmark::kMicrosecond)->MinTime(2);
+
+// A fixed number of rounds: each needs a task to delete.
+constexpr int kDeletions = 2'000;
+
+void Delete(benchmark::State& state) {
+    BenchAppliance& appliance = Appliance();
+    Json::Value parameters(Json::objectValue);
+    for (auto _ : state) {
+        parameters["task"] = appliance.NextId();
+        benchmark::DoNotOptimize(appliance.Call("delete", parameters));
+    }
+}
+BENCHMARK(Delete)->Unit(benchmark::kMicrosecond)->Iterations(kDeletions);
+
+void Delete_floor(benchmark::State& state) {
+    SQLite::Database& raw = RawDatabase();
+    SQLite::Statement begin(raw, "BEGIN IMMEDIATE");
+    SQLite::Statement commit(raw, "COMMIT");
+    SQLite::Statement remove(raw, "DELETE FROM task WHERE id = ?");
+    int id = 0;
+    for (auto _ : state) {
+        begin.exec();
+        begin.reset();
+        remove.bind(1, ++id);
+        remove.exec();
+        remove.reset();
+        commit.exec();
+        commit.reset();
+    }
+}
+BENCHMARK(Delete_floor)->Unit(benchmark::kMicrosecond)->Iterations(kDeletions);
+
+void PageOf50Of100000(benchmark::State& state) {
+    const BenchAppliance appliance(kManyTasks);
+    const Json::Value parameters = Parameters(kPage);
+    benchmark::DoNotOptimize(appliance.Call("list", parameters));
+    for (auto _ : state) {
+        benchmark::DoNotOptimize(appliance.Call("list", parameters));
+    }
+}
+BENCHMARK(PageOf50Of100000)->Unit(benchmark::kMillisecond);
+
+}  // namespace
+}  // namespace orva
+
+BENCHMARK_MAIN();
