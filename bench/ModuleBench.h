@@ -28,13 +28,12 @@ class BenchAppliance {
     std::filesystem::path Root() const { return root; }
     std::filesystem::path Database() const;
 
-    // An id that no earlier call gave.
-    int NextId() { return ++lastId; }
+    // Stores one more task and yields its id.
+    int AddTask() const;
 
   private:
     std::filesystem::path root;
     std::unique_ptr<ModuleLoader> modules;
-    int lastId = 0;
 };
 
 // Parses a parameter document of this program's own.

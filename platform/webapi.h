@@ -70,6 +70,7 @@ class APIResponse {
   public:
     // The method succeeded; `document` is sent back.
     void SetSuccess(const Json::Value& document);
+    void SetSuccess(Json::Value&& document);
 
     // The method failed with `code`; `details` are sent back with it.
     void SetError(int code, const Json::Value& details);
@@ -78,13 +79,13 @@ class APIResponse {
     bool IsSet() const { return set; }
     bool IsSuccess() const { return success; }
     int GetErrorCode() const { return errorCode; }
-    const Json::Value& GetDocument() const { return document; }
+    const Json::Value& GetDocument() const { return answer; }
 
   private:
     bool set = false;
     bool success = false;
     int errorCode = 0;
-    Json::Value document;
+    Json::Value answer;
 };
 
 // A method: reads the request, sets the response. Neither pointer is null; neither is kept.

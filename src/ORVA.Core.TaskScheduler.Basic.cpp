@@ -74,7 +74,7 @@ void TaskSchedulerBasicHandler::Process_v1(const char* method) {
         return;
     }
     if (success) {
-        response->SetSuccess(result);
+        response->SetSuccess(std::move(result));
     } else {
         ReportError();
     }

@@ -134,7 +134,7 @@ void TaskSchedulerHandler::Process_v1(const char* method) {
         }
         Json::Value result;
         if ((this->*operation.run)(result)) {
-            response->SetSuccess(result);
+            response->SetSuccess(std::move(result));
         } else {
             ReportError();
         }

@@ -31,9 +31,9 @@ constexpr std::array<const char*, 7> kRepeats = {"never",     "daily",       "we
 constexpr int kFirstYear = 1970;
 
 // Reads the members one after the other; after the first one refused the rest is not looked at.
-class Reader {
+class SectionReader {
   public:
-    explicit Reader(const Json::Value& sectionToRead) : section(sectionToRead) {}
+    explicit SectionReader(const Json::Value& sectionToRead) : section(sectionToRead) {}
 
     void Refuse(const char* name, const std::string& reason) {
         if (!problem) {
@@ -179,7 +179,7 @@ std::string FormatWeekDays(unsigned days) {
     return text;
 }
 
-void ReadWeekDays(Reader& reader, Schedule& schedule) {
+void ReadWeekDays(SectionReader& reader, Schedule& schedule) {
     const std::optional<std::string> text = reader.Text(kWeekName);
     if (!text) {
         return;
@@ -193,7 +193,7 @@ void ReadWeekDays(Reader& reader, Schedule& schedule) {
 }
 
 // The form of a task that has no date holds an empty text, which comes back when it is saved.
-void ReadDate(Reader& reader, Schedule& schedule) {
+void ReadDate(SectionReader& reader, Schedule& schedule) {
     const std::optional<std::string> text = reader.Text(kDate);
     if (!text) {
         return;
@@ -207,7 +207,7 @@ void ReadDate(Reader& reader, Schedule& schedule) {
 }
 
 // What no member shows by itself.
-void CheckTogether(Reader& reader, const Schedule& schedule) {
+void CheckTogether(SectionReader& reader, const Schedule& schedule) {
     if (schedule.mode == Schedule::Mode::kWeekly && schedule.weekDays == 0) {
         reader.Refuse(kWeekName, "names no day");
     }
@@ -231,7 +231,7 @@ std::optional<std::string> ApplyScheduleSection(const Json::Value& section, Sche
     int lastHour = result.lastMinute / 60;
     int lastMinute = result.lastMinute % 60;
 
-    Reader reader(section);
+    SectionReader reader(section);
     reader.Word(kMode, kModes, result.mode);
     ReadWeekDays(reader, result);
     ReadDate(reader, result);

@@ -144,11 +144,11 @@ std::optional<Start> FirstOfDay(const Schedule& schedule, const absl::TimeZone& 
     }
 
     const int steps = (schedule.lastMinute - schedule.firstMinute) / schedule.intervalMinutes;
-    const TimeInfo lastInfo = zone.At(absl::CivilSecond(first + steps * schedule.intervalMinutes));
-    const absl::Duration length = absl::Minutes(steps * schedule.intervalMinutes);
+    const int minutes = steps * schedule.intervalMinutes;
+    const TimeInfo lastInfo = zone.At(absl::CivilSecond(first + minutes));
     const bool steadyClock = firstInfo.kind == TimeInfo::UNIQUE &&
                              lastInfo.kind == TimeInfo::UNIQUE &&
-                             lastInfo.pre - firstInfo.pre == length;
+                             lastInfo.pre - firstInfo.pre == absl::Minutes(minutes);
     if (!steadyClock) {
         return FirstOfSeriesAtClockChange(schedule, zone, first,
                                           absl::CivilMinute(day) + schedule.lastMinute, after);

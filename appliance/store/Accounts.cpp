@@ -10,7 +10,7 @@ namespace orva {
 namespace {
 
 constexpr std::size_t kUsualEntry = 1024;
-constexpr std::size_t kLargestEntry = 1024 * 1024;
+constexpr std::size_t kLargestEntry = 1024 * kUsualEntry;
 
 // Calls `lookUp(entry, buffer, size, result)`, one of the reentrant look-ups, with a buffer that
 // grows until the account fits. Yields the account's name; empty when there is none.

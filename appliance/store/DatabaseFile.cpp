@@ -21,12 +21,12 @@ constexpr mode_t kDirectoryMode = 0770;
 constexpr mode_t kParentMode = 0755;
 constexpr std::chrono::milliseconds kLockRetry{5};
 
-[[noreturn]] void FailBySystem(const std::string& doing,
-                               std::source_location place = std::source_location::current()) {
+[[noreturn]] void FailBySystem(const std::string& doing, const char* file = __builtin_FILE(),
+                               int line = __builtin_LINE()) {
     const int error = errno;
     const bool noSpace = error == ENOSPC || error == EDQUOT || error == EROFS;
     throw StoreFailure(noSpace ? kErrDatabaseFull : kErrDatabase,
-                       doing + ": " + std::strerror(error), place);
+                       doing + ": " + std::strerror(error), file, line);
 }
 
 std::string DirectoryOf(const std::string& file) {

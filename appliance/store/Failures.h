@@ -8,8 +8,7 @@ namespace orva {
 
 // Records the failure as this thread's last error; yields -1.
 inline int RecordFailure(const StoreFailure& failure) {
-    return Fail(failure.Code(), failure.Place().file_name(),
-                static_cast<int>(failure.Place().line()));
+    return Fail(failure.Code(), failure.File(), failure.Line());
 }
 
 // Runs `operation`, which yields an int, and turns the exceptions of the store into the last error

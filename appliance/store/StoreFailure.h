@@ -1,7 +1,6 @@
 #pragma once
 
 #include <exception>
-#include <source_location>
 #include <string>
 #include <utility>
 
@@ -13,13 +12,18 @@ namespace orva {
 // the platform's functions turn it into the last error.
 class StoreFailure : public std::exception {
   public:
+    // Raised at the caller's line. `raisedInFile` must outlive the failure.
     StoreFailure(ErrorCode failureCode, std::string failureReason,
-                 std::source_location raisedAt = std::source_location::current())
-        : code(failureCode), reason(std::move(failureReason)), place(raisedAt) {}
+                 const char* raisedInFile = __builtin_FILE(), int raisedAtLine = __builtin_LINE())
+        : code(failureCode),
+          reason(std::move(failureReason)),
+          file(raisedInFile),
+          line(raisedAtLine) {}
 
     const char* what() const noexcept override { return reason.c_str(); }
     ErrorCode Code() const { return code; }
-    const std::source_location& Place() const { return place; }
+    const char* File() const { return file; }
+    int Line() const { return line; }
 
     // Whether the database is at fault, and not the caller: such failures are logged where they
     // happen, since nobody above knows more of them.
@@ -28,7 +32,8 @@ class StoreFailure : public std::exception {
   private:
     ErrorCode code;
     std::string reason;
-    std::source_location place;
+    const char* file;
+    int line;
 };
 
 }  // namespace orva

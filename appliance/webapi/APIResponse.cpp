@@ -1,16 +1,20 @@
+#include <utility>
+
 #include "platform/webapi.h"
 
 namespace ORVA {
 
-void APIResponse::SetSuccess(const Json::Value& newDocument) {
-    document = newDocument;
+void APIResponse::SetSuccess(const Json::Value& document) { SetSuccess(Json::Value(document)); }
+
+void APIResponse::SetSuccess(Json::Value&& document) {
+    answer = std::move(document);
     errorCode = 0;
     success = true;
     set = true;
 }
 
 void APIResponse::SetError(int code, const Json::Value& details) {
-    document = details;
+    answer = details;
     errorCode = code;
     success = false;
     set = true;
