@@ -19,7 +19,6 @@
 namespace {
 
 using orva::TaskStore;
-using testing::ElementsAre;
 using testing::HasSubstr;
 
 class DatabaseTest : public StoreTest {
