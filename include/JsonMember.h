@@ -1,4 +1,5 @@
-// Reading stored sections, which may be older than this code or damaged.
+// Reading documents whose shape nobody has checked: requests, and stored sections that may be older
+// than this code or damaged.
 #pragma once
 
 #include <json/value.h>
@@ -8,4 +9,9 @@
 // `value`.
 inline const Json::Value& MemberOf(const Json::Value& value, const char* key) {
     return value.isObject() ? value[key] : Json::Value::nullSingleton();
+}
+
+// True for an integer of any size; jsoncpp's own isInt() and isIntegral() take 5.0 for one too.
+inline bool IsJsonInteger(const Json::Value& value) {
+    return value.type() == Json::intValue || value.type() == Json::uintValue;
 }

@@ -10,6 +10,6 @@
 // Compact text of `value`, ended by a newline.
 std::string WriteJsonText(const Json::Value& value);
 
-// Parses `text` into `value`. False when it is not JSON; `value` then holds whatever the reader
-// produced. jsoncpp throws on nesting deeper than it supports.
+// Parses `text` into `value`. False when it is not JSON, with whatever the reader produced of it in
+// `value`, or when it is nested deeper than 1,000 levels, with null there. Never throws for its text.
 bool ParseJsonText(const std::string& text, Json::Value& value);

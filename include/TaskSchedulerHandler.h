@@ -34,7 +34,8 @@ class TaskSchedulerHandler {
     // row without "action" ends up with a null one.
     void TranslateActionKey(Json::Value& row, const std::string& appName);
 
-    // Record an error; the first one wins and later ones are ignored.
+    // Record an error; the first one wins and later ones are ignored. Code 0 is no error: what it
+    // comes with may still be replaced, and the details stay until others are given.
     void SetError(int code, const std::string& message);
     void SetError(int code, const std::string& message, const Json::Value& details);
 

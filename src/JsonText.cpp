@@ -9,5 +9,11 @@ std::string WriteJsonText(const Json::Value& value) { return Json::FastWriter().
 
 bool ParseJsonText(const std::string& text, Json::Value& value) {
     constexpr bool kCollectComments = true;
-    return Json::Reader().parse(text, value, kCollectComments);
+    try {
+        return Json::Reader().parse(text, value, kCollectComments);
+    } catch (const Json::Exception&) {
+        // The reader throws on nesting deeper than it supports and leaves an unfinished value.
+        value = Json::Value();
+        return false;
+    }
 }

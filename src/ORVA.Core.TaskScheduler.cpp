@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "include/ErrorCodes.h"
+#include "include/JsonMember.h"
 #include "include/TaskSchedulerHandler.h"
 #include "include/lib.h"
 #include "platform/qlibc.h"
@@ -32,11 +33,6 @@ bool IsTask(const _tag_orva_sched_task_* task, int line) {
     syslog(LOG_ERR, "%s:%d Invaild Argument (%s)=[%d]\n", kSourceFile, line, "0 != pTask", 0);
     QLIBCErrSetEx(kInvalidArgument, kSourceFile, line);
     return false;
-}
-
-// jsoncpp's isInt() takes 5.0 for an integer.
-bool IsJsonInteger(const Json::Value& value) {
-    return value.type() == Json::intValue || value.type() == Json::uintValue;
 }
 
 bool IsId(const Json::Value& value) { return IsJsonInteger(value) && value.isInt(); }
@@ -143,7 +139,11 @@ void TaskSchedulerHandler::Process_v1(const char* method) {
 }
 
 void TaskSchedulerHandler::SetError(int code, const std::string& message) {
-    SetError(code, message, Json::Value());
+    if (errorCode != 0) {
+        return;
+    }
+    errorCode = code;
+    errorMessage = message;
 }
 
 void TaskSchedulerHandler::SetError(int code, const std::string& message,
@@ -151,8 +151,7 @@ void TaskSchedulerHandler::SetError(int code, const std::string& message,
     if (errorCode != 0) {
         return;
     }
-    errorCode = code;
-    errorMessage = message;
+    SetError(code, message);
     errorDetails = details;
 }
 

@@ -73,17 +73,26 @@ constexpr std::array<Kind, 9> kEditableKinds{{
 }};
 constexpr std::span<const Kind> kCreatableKinds(kEditableKinds.data(), 4);
 
-// Has the handler of the kind `key` serve the request, or answers that there is no such kind.
-void ServeKind(std::span<const Kind> kinds, const std::string& key, int logLine,
-               APIRequest* request, APIResponse* response, const char* method) {
+// The kind that `key` names, a text or a request's parameter; null when there is no such kind.
+template <class Key>
+const Kind* FindKind(std::span<const Kind> kinds, const Key& key) {
     for (const Kind& kind : kinds) {
-        if (key == kind.key) {
-            kind.serve(request, response, method);
-            return;
+        if (kind.key == key) {
+            return &kind;
         }
     }
-    syslog(LOG_ERR, "%s:%d Unknown app type: %s", kSourceFile, logLine, key.c_str());
-    response->SetError(kBadParameter, Json::Value());
+    return nullptr;
+}
+
+// Has the handler of the kind serve the request, or answers that there is no kind `key`.
+void ServeKind(const Kind* kind, const std::string& key, int logLine, APIRequest* request,
+               APIResponse* response, const char* method) {
+    if (kind == nullptr) {
+        syslog(LOG_ERR, "%s:%d Unknown app type: %s", kSourceFile, logLine, key.c_str());
+        response->SetError(kBadParameter, Json::Value());
+        return;
+    }
+    kind->serve(request, response, method);
 }
 
 }  // namespace
@@ -132,7 +141,7 @@ void TaskSchedulerGet_v1(APIRequest* request, APIResponse* response) {
         response->SetError(kLoadFailed, Json::Value());
         return;
     }
-    ServeKind(kEditableKinds, key, kLineGet, request, response, "get");
+    ServeKind(FindKind(kEditableKinds, key), key, kLineGet, request, response, "get");
 }
 
 void TaskSchedulerSet_v1(APIRequest* request, APIResponse* response) {
@@ -146,7 +155,7 @@ void TaskSchedulerSet_v1(APIRequest* request, APIResponse* response) {
         response->SetError(kLoadFailed, Json::Value());
         return;
     }
-    ServeKind(kEditableKinds, key, kLineSet, request, response, "set");
+    ServeKind(FindKind(kEditableKinds, key), key, kLineSet, request, response, "set");
 }
 
 void TaskSchedulerCreate_v1(APIRequest* request, APIResponse* response) {
@@ -155,7 +164,7 @@ void TaskSchedulerCreate_v1(APIRequest* request, APIResponse* response) {
         response->SetError(kBadParameter, Json::Value());
         return;
     }
-    ServeKind(kCreatableKinds, type.Get(), kLineCreate, request, response, "set");
+    ServeKind(FindKind(kCreatableKinds, type), type.Get(), kLineCreate, request, response, "set");
 }
 
 }  // extern "C"

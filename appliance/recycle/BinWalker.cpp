@@ -13,7 +13,7 @@ namespace {
 
 // About ten thousand names: enough that sorting them by inode makes the removals run through the
 // inode tables instead of jumping about in them.
-constexpr std::size_t kBufferBytes = 512 * 1024;
+constexpr std::size_t kBufferBytes = std::size_t{512} * 1024;
 
 // A file system may skip names when others are removed between two reads of a directory, and files
 // may keep coming. The first needs another pass, the second must not keep us forever.

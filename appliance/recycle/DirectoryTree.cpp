@@ -59,7 +59,7 @@ int OpenDirectoryAt(int parent, const char* name) {
     return ::openat(parent, name, O_RDONLY | kDirectoryFlags);
 }
 
-DirectoryTree::DirectoryTree(FileDescriptor parent, std::string binName, FileDescriptor bin,
+DirectoryTree::DirectoryTree(FileDescriptor parent, const std::string& binName, FileDescriptor bin,
                              FileInfo binInfo)
     : binParent(std::move(parent)), binDirectory(std::move(bin)), device(binInfo.device) {
     names.assign(binName.c_str(), binName.c_str() + binName.size() + 1);

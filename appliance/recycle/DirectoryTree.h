@@ -24,7 +24,8 @@ class DirectoryTree {
 
     // `binName` is the bin's name in the directory `parent`; both descriptors stay open as long as
     // the tree lives.
-    DirectoryTree(FileDescriptor parent, std::string binName, FileDescriptor bin, FileInfo binInfo);
+    DirectoryTree(FileDescriptor parent, const std::string& binName, FileDescriptor bin,
+                  FileInfo binInfo);
 
     // Takes over the open directory `name` of `parent`. Throws std::length_error after 2^32-2 of
     // them.

@@ -103,15 +103,15 @@ TEST_F(StoreThreadsTest, ReadersSeeWholeListsWhileOthersWrite) {
 }
 
 TEST_F(StoreThreadsTest, NoTwoTasksGetTheSameId) {
-    constexpr int kThreads = 4;
-    constexpr int kEach = 25;
+    constexpr std::size_t kThreads = 4;
+    constexpr std::size_t kEach = 25;
     const auto other = OtherProcess();
     std::vector<std::vector<int>> ids(kThreads);
     std::vector<std::thread> threads;
     for (std::size_t number = 0; number < kThreads; ++number) {
         threads.emplace_back([&, number] {
             TaskStore& store = number % 2 == 0 ? *TaskStore::Current() : *other;
-            for (int count = 0; count < kEach; ++count) {
+            for (std::size_t count = 0; count < kEach; ++count) {
                 ids[number].push_back(store.Save(SampleTask("x")));
             }
         });
@@ -121,17 +121,19 @@ TEST_F(StoreThreadsTest, NoTwoTasksGetTheSameId) {
         threads[number].join();
         all.insert(ids[number].begin(), ids[number].end());
     }
-    EXPECT_EQ(all.size(), std::size_t{kThreads * kEach});
-    EXPECT_EQ(TaskStore::Current()->CurrentSnapshot()->Count(), std::size_t{kThreads * kEach});
+    EXPECT_EQ(all.size(), kThreads * kEach);
+    EXPECT_EQ(TaskStore::Current()->CurrentSnapshot()->Count(), kThreads * kEach);
 }
 
 TEST_F(StoreThreadsTest, TheStoreIsCreatedOnceWhenAllWantItAtOnce) {
     std::atomic<int> failures = 0;
     std::vector<std::unique_ptr<TaskStore>> stores;
+    stores.reserve(6);
     for (int number = 0; number < 6; ++number) {
         stores.push_back(OtherProcess());
     }
     std::vector<std::thread> threads;
+    threads.reserve(stores.size());
     for (const auto& store : stores) {
         threads.emplace_back([&failures, &store] {
             try {
@@ -150,6 +152,7 @@ TEST_F(StoreThreadsTest, TheStoreIsCreatedOnceWhenAllWantItAtOnce) {
 
 TEST_F(StoreThreadsTest, OneSnapshotSortsForAllThreads) {
     std::vector<orva::TaskData> tasks;
+    tasks.reserve(500);
     for (int number = 0; number < 500; ++number) {
         tasks.push_back(SampleTask(std::to_string(number * 7919 % 503)));
     }
@@ -157,6 +160,7 @@ TEST_F(StoreThreadsTest, OneSnapshotSortsForAllThreads) {
     const auto snapshot = TaskStore::Current()->CurrentSnapshot();
     std::vector<const orva::SortOrder*> orders(8);
     std::vector<std::thread> threads;
+    threads.reserve(orders.size());
     for (auto& order : orders) {
         threads.emplace_back(
             [&order, &snapshot] { order = &snapshot->Order(orva::SortKey::kName, true); });
