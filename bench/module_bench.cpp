@@ -11,15 +11,13 @@
 #include <json/writer.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <cstdlib>
-#include <map>
 #include <string>
 #include <utility>
-#include <vector>
 
 #include "appliance/webapi/ApiAnswer.h"
 #include "appliance/webapi/JsonWriter.h"
+#include "bench/FloorReporter.h"
 
 namespace orva {
 namespace {
@@ -208,40 +206,7 @@ void Delete_floor(benchmark::State& state) {
 }
 BENCHMARK(Delete_floor)->Unit(benchmark::kMicrosecond)->UseRealTime();
 
-// Remembers each benchmark's median and prints those that have a floor beside it.
-class FloorReporter : public benchmark::ConsoleReporter {
-  public:
-    FloorReporter() : ConsoleReporter(OO_Tabular) {}
-
-    void ReportRuns(const std::vector<Run>& runs) override {
-        for (const Run& run : runs) {
-            if (run.run_type == Run::RT_Iteration || run.aggregate_name == "median") {
-                times[run.run_name.function_name] = run.GetAdjustedRealTime();
-            }
-        }
-        ConsoleReporter::ReportRuns(runs);
-    }
-
-    void PrintRatios() const {
-        for (const auto& [name, time] : times) {
-            const auto floor = times.find(name + "_floor");
-            if (floor != times.end()) {
-                std::printf("%-20s takes %.2f times its floor\n", name.c_str(),
-                            time / floor->second);
-            }
-        }
-    }
-
-  private:
-    std::map<std::string, double> times;
-};
-
 }  // namespace
 }  // namespace orva
 
-int main(int argc, char** argv) {
-    benchmark::Initialize(&argc, argv);
-    orva::FloorReporter reporter;
-    benchmark::RunSpecifiedBenchmarks(&reporter);
-    reporter.PrintRatios();
-}
+int main(int argc, char** argv) { return orva::RunBenchmarks(argc, argv); }

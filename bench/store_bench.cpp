@@ -7,6 +7,7 @@
 #include <benchmark/benchmark.h>
 #include <sys/resource.h>
 
+#include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
@@ -43,6 +44,7 @@ class Appliance {
         root = pattern;
         orva::SetRoot(root);
         std::vector<orva::TaskData> tasks;
+        tasks.reserve(static_cast<std::size_t>(TaskCount()));
         for (int number = 0; number < TaskCount(); ++number) {
             tasks.push_back(Task(number));
         }

@@ -11,5 +11,6 @@
 std::string WriteJsonText(const Json::Value& value);
 
 // Parses `text` into `value`. False when it is not JSON, with whatever the reader produced of it in
-// `value`, or when it is nested deeper than 1,000 levels, with null there. Never throws for its text.
+// `value`, or when it is nested deeper than 1,000 levels, with null there. Never throws for its
+// text.
 bool ParseJsonText(const std::string& text, Json::Value& value);

@@ -30,7 +30,8 @@ int QLIBCStrReplace(char* buffer, const char* from, const char* to, int flags, i
 // backslash before each special byte, else (a text with line ends) double quotes. A buffer of twice
 // the length of `text` plus two bytes is enough for every text but the empty one, whose two quotes
 // and zero need three bytes. Returns 0; negative, with an empty buffer where it has room for that,
-// when the word would not fit or an argument is null.
+// when the word would not fit (errno is ERANGE) or an argument is null or the size not positive
+// (EINVAL).
 int QLIBCEncShParam(const char* text, char* buffer, int size);
 
 // --- String list --------------------------------------------------------------------------------

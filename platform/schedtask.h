@@ -28,9 +28,12 @@ void ORVASchedTaskFree(_tag_orva_sched_task_* task);
 // that is not stored; the record then keeps what it had.
 int ORVASchedTaskLoad(int id, _tag_orva_sched_task_* task);
 
-// Stores the record durably: a new record becomes a task with a new id (never one that was used
-// before), any other replaces the stored task with its id. Fails without a name or an app, and for
-// a stored task that is gone. Afterwards ORVASchedTaskGetID yields the task's id.
+// Stores the record durably. A new record becomes a task with a new id, never one that was used
+// before. Any other changes the stored task with its id in what was changed in the record since it
+// took over that task, and in nothing else: changes that others saved meanwhile stay. Afterwards
+// the record shows the task as it is stored. Fails without a name, an app or an owner (a new record
+// has none when the program's account is not known to this machine), and for a stored task that is
+// gone.
 int ORVASchedTaskSave(_tag_orva_sched_task_* task);
 
 // Deletes stored task `id` durably. Fails when there is none.
@@ -115,11 +118,13 @@ bool ORVASchedTaskConvertToJson_Basic(const _tag_orva_sched_task_& task, Json::V
 // "interval_min", "last_hour", "last_min", "run_missed" and "next_trigger_time".
 bool ORVASchedTaskConvertToJson_Schedule(const _tag_orva_sched_task_& task, Json::Value& doc);
 
-// Read the member "basic" of `doc` into the record. "id" is the decimal text of a stored task's id,
-// whose stored properties the record takes over first, or "-1" for a new task. Then "task_name"
-// (1 to 255 bytes of printable UTF-8), "owner" (an account of this machine; null or absent keeps
-// the one it has) and "enabled" ("on" or "off") are applied. False, with the record unchanged, when
-// a member is refused.
+// Read the member "basic" of `doc` into the record. "id" is the id of a stored task, whose stored
+// properties the record takes over first, or -1 for a new task; as decimal text or as the integer
+// that the other direction writes. Then "task_name" (1 to 255 bytes of printable UTF-8), "owner"
+// (an account of this machine) and "enabled" ("on" or "off") are applied; null or absent ones keep
+// what the record has. A name or an owner that a stored task has already passes as it is, even when
+// the account is gone; another one is refused where the stored task does not let it be changed.
+// False, with the record unchanged, when a member is refused.
 bool ORVASchedTaskConvertFromJson_Basic(const Json::Value& doc, _tag_orva_sched_task_& task);
 
 // Read the member "schedule" of `doc` into the record. Absent and null members keep what the record

@@ -34,7 +34,9 @@ class JSConfigParser {
 class LocalizedStringParser {
   public:
     // The texts of `directory`, an absolute path of the appliance: its file strings.json, an object
-    // {section: {key: text}}. An empty object when the file is missing or is not such a document.
+    // {section: {key: text}}. A section that is no object and a text that is no string are left
+    // out, and one log line for each version of the file names the first of them. An empty object
+    // when the file is missing, is not JSON or is no object.
     Json::Value ParseTexts(const std::string& directory) const;
 };
 

@@ -60,7 +60,11 @@ constexpr std::array kServiceTable = {
 class StringHash {
   public:
     explicit StringHash(int size) : table(QLIBCSzHashAlloc(size)) {}
-    ~StringHash() { QLIBCSzHashFree(table); }
+    ~StringHash() {
+        if (table != nullptr) {
+            QLIBCSzHashFree(table);
+        }
+    }
     StringHash(const StringHash&) = delete;
     StringHash& operator=(const StringHash&) = delete;
 

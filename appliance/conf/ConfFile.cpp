@@ -5,7 +5,7 @@
 #include <optional>
 #include <utility>
 
-#include "appliance/util/StrictJson.h"
+#include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {

@@ -17,8 +17,7 @@ namespace {
 
 constexpr const char* kConfFile = "/usr/orva/etc/orva.conf";
 // One per root; only tests have several.
-constexpr std::size_t kMaxFiles = 4;
-constexpr std::size_t kMaxBytes = 1 << 20;
+constexpr orva::FileCacheLimits kLimits{.files = 4, .totalBytes = 4 << 20, .fileBytes = 1 << 20};
 
 orva::ConfFile ParseAndLog(const std::string& content, const std::string& path) {
     orva::ConfFile file = orva::ParseConf(content);
@@ -32,7 +31,7 @@ orva::ConfFile ParseAndLog(const std::string& content, const std::string& path) 
 }  // namespace
 
 OrvaConf::OrvaConf() {
-    static orva::FileCache<Values> cache(kMaxFiles, kMaxBytes, false,
+    static orva::FileCache<Values> cache(kLimits, false,
                                          [](const std::string& content, const std::string& path) {
                                              return Values{ParseAndLog(content, path)};
                                          });

@@ -28,12 +28,8 @@ bool ReadText(const Json::Value& object, std::string_view name, std::string& tex
 
 std::optional<ORVAPackageTool::PackageInfo> ParsePackageFile(const std::string& content,
                                                              std::string& error) {
-    const std::optional<Json::Value> document = ParseStrictJson(content, error);
+    const std::optional<Json::Value> document = ParseStrictObject(content, error);
     if (!document) {
-        return std::nullopt;
-    }
-    if (!document->isObject()) {
-        error = "the document is no object";
         return std::nullopt;
     }
     ORVAPackageTool::PackageInfo info;

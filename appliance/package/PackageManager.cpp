@@ -22,8 +22,8 @@ namespace {
 
 constexpr const char* kPackages = "/usr/orva/packages";
 // More than any appliance has installed; a parsed description takes some hundred bytes.
-constexpr std::size_t kMaxFiles = 8192;
-constexpr std::size_t kMaxBytes = 1 << 20;
+constexpr orva::FileCacheLimits kLimits{
+    .files = 8192, .totalBytes = 64 << 20, .fileBytes = 1 << 20};
 
 std::optional<PackageInfo> ParseAndLog(const std::string& content, const std::string& path) {
     std::string error;
@@ -60,8 +60,7 @@ std::list<std::string> PackageManager::enumPackages(const PackageFilter* /*filte
 
 bool PackageManager::getPackageInfo(const std::string& id, PackageInfo& info,
                                     const PackageQuery* /*query*/) const {
-    static orva::FileCache<std::optional<PackageInfo>> cache(kMaxFiles, kMaxBytes, true,
-                                                             ParseAndLog);
+    static orva::FileCache<std::optional<PackageInfo>> cache(kLimits, true, ParseAndLog);
     if (!orva::IsSafeName(id)) {
         orva::Fail(orva::kErrBadArgument);
         return false;

@@ -76,7 +76,9 @@ int main(int argc, char** argv) {
     const CLI::Option* importing =
         action
             ->add_option("--import", importFile,
-                         "Store the tasks of a JSON array, all or none (-: standard input)")
+                         "Store the tasks of a JSON array, all or none (-: standard input). A "
+                         "task's own id may be " +
+                             std::to_string(orva::kHighestImportedId) + " at most")
             ->type_name("FILE");
     const CLI::Option* exporting =
         action

@@ -19,6 +19,7 @@
 #include "appliance/util/FileRead.h"
 #include "appliance/util/Name.h"
 #include "appliance/util/StrictJson.h"
+#include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {
@@ -113,8 +114,8 @@ int Store(const std::string& path, const Json::Value& document) {
     return WriteFileAtomically(path, Json::writeString(writer, document) + "\n");
 }
 
-// Keeps other writers of the registry away while it lives. The lock has a file of its own because
-// the registry is replaced, and a lock on the replaced file would hold nobody.
+// The lock has a file of its own because the registry is replaced, and a lock on the replaced file
+// would hold nobody.
 FileDescriptor Lock(const std::string& path) {
     FileDescriptor file(
         ::open((path + ".lock").c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0640));
@@ -124,6 +125,27 @@ FileDescriptor Lock(const std::string& path) {
         }
     }
     return file;
+}
+
+// The registry for a change; keeps other writers away while it lives.
+struct LockedRegistry {
+    std::string path;
+    FileDescriptor lock;
+    Json::Value document;
+};
+
+std::optional<LockedRegistry> LoadLocked() {
+    std::string path = ResolvePath(kRegistryFile);
+    FileDescriptor lock = Lock(path);
+    if (!lock.IsOpen()) {
+        Fail(kErrSystem);
+        return std::nullopt;
+    }
+    std::optional<Json::Value> document = Load(path);
+    if (!document) {
+        return std::nullopt;
+    }
+    return LockedRegistry{std::move(path), std::move(lock), std::move(*document)};
 }
 
 }  // namespace
@@ -160,16 +182,11 @@ int ShareRegistry::Add(const Share& share) const {
     if (!IsSafeName(share.name) || !IsAppliancePath(share.path) || !IsKind(share.kind)) {
         return Fail(kErrBadArgument);
     }
-    const std::string path = ResolvePath(kRegistryFile);
-    const FileDescriptor lock = Lock(path);
-    if (!lock.IsOpen()) {
-        return Fail(kErrSystem);
-    }
-    std::optional<Json::Value> document = Load(path);
-    if (!document) {
+    std::optional<LockedRegistry> registry = LoadLocked();
+    if (!registry) {
         return -1;
     }
-    if (FindEntry(*document, share.name) != nullptr) {
+    if (FindEntry(registry->document, share.name) != nullptr) {
         return Fail(kErrNotAllowed);
     }
     Json::Value entry(Json::objectValue);
@@ -177,21 +194,16 @@ int ShareRegistry::Add(const Share& share) const {
     entry[kPath] = share.path;
     entry[kKind] = share.kind;
     entry[kRecycleBin] = share.recycleBin;
-    (*document)[kShares].append(std::move(entry));
-    return Store(path, *document);
+    registry->document[kShares].append(std::move(entry));
+    return Store(registry->path, registry->document);
 }
 
 int ShareRegistry::SetRecycle(const std::string& name, bool enabled) const {
-    const std::string path = ResolvePath(kRegistryFile);
-    const FileDescriptor lock = Lock(path);
-    if (!lock.IsOpen()) {
-        return Fail(kErrSystem);
-    }
-    std::optional<Json::Value> document = Load(path);
-    if (!document) {
+    std::optional<LockedRegistry> registry = LoadLocked();
+    if (!registry) {
         return -1;
     }
-    Json::Value* entry = FindEntry(*document, name);
+    Json::Value* entry = FindEntry(registry->document, name);
     if (entry == nullptr) {
         return Fail(kErrNotFound);
     }
@@ -203,7 +215,7 @@ int ShareRegistry::SetRecycle(const std::string& name, bool enabled) const {
         return 0;
     }
     (*entry)[kRecycleBin] = enabled;
-    return Store(path, *document);
+    return Store(registry->path, registry->document);
 }
 
 }  // namespace orva

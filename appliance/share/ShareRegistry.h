@@ -41,7 +41,8 @@ class ShareRegistry {
     // Switches a share's recycle bin on or off, durably. On makes the folder ".recycle" in the
     // share's directory where it is missing, for the share's owner and group with no more rights
     // than the share itself gives them; off leaves the folder and what is in it. kErrNotAllowed
-    // when a link or a file stands in the folder's place.
+    // when a link or a file stands in the folder's place, or when this process may not give the
+    // folder to the share's group.
     [[nodiscard]] int SetRecycle(const std::string& name, bool enabled) const;
 };
 

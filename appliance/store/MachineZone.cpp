@@ -1,5 +1,6 @@
 #include "appliance/store/MachineZone.h"
 
+#include <atomic>
 #include <climits>
 #include <cstdlib>
 #include <string_view>
@@ -39,6 +40,19 @@ std::string CurrentZoneName(const std::string& link) {
     return *fromEnvironment == '\0' ? kUtc : fromEnvironment;
 }
 
+// The absolute path in a spelling that no earlier call in this process has yielded. Zones are kept
+// by name for as long as the process lives: what a file holds now has to be asked for under a name
+// that is new.
+std::string FreshSpelling(const std::string& path) {
+    static std::atomic<unsigned> calls = 0;
+    std::string detour;
+    // The number in binary: "/." for a one, "/" for a zero.
+    for (unsigned number = ++calls; number != 0; number /= 2) {
+        detour += number % 2 == 0 ? "/" : "/.";
+    }
+    return detour + path;
+}
+
 }  // namespace
 
 MachineZone::MachineZone(std::string localtimeLink)
@@ -46,13 +60,16 @@ MachineZone::MachineZone(std::string localtimeLink)
 
 absl::TimeZone MachineZone::Now() {
     std::string current = CurrentZoneName(link);
+    FileIdentity identity;
+    const bool isFile = current.front() == '/' && GetFileIdentity(current, identity) == 0;
     const std::lock_guard lock(mutex);
-    if (current != name) {
-        if (!absl::LoadTimeZone(current, &zone)) {
+    if (current != name || identity != file) {
+        if (!absl::LoadTimeZone(isFile ? FreshSpelling(current) : current, &zone)) {
             zone = absl::UTCTimeZone();
             syslog(LOG_ERR, "no data for time zone \"%s\"; using UTC", current.c_str());
         }
         name = std::move(current);
+        file = identity;
     }
     return zone;
 }

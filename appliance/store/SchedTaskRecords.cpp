@@ -1,7 +1,13 @@
 // The platform's functions on single records.
 
+#include <syslog.h>
+#include <unistd.h>
+
+#include <memory>
 #include <new>
+#include <optional>
 #include <string>
+#include <utility>
 
 #include "appliance/store/Failures.h"
 #include "appliance/store/TaskList.h"
@@ -37,9 +43,20 @@ int SetFlag(Record* task, orva::TaskFlag flag, int value, int line = __builtin_L
     });
 }
 
-// A task that lacks one of these would be in the list and of no use to anybody.
-bool IsComplete(const TaskData& task) {
-    return !task.name.empty() && !task.app.empty() && !task.owner.empty();
+// Why the task cannot be stored; nothing when it can. A task that lacks one of these would be in
+// the list and of no use to anybody.
+std::optional<std::string> WhatIsMissing(const TaskData& task) {
+    if (task.name.empty()) {
+        return "basic.task_name: is missing";
+    }
+    if (task.app.empty()) {
+        return "basic.app: is missing";
+    }
+    if (task.owner.empty()) {
+        return "basic.owner: is missing, and user id " + std::to_string(::geteuid()) +
+               " has no account to own the task";
+    }
+    return std::nullopt;
 }
 
 }  // namespace
@@ -81,13 +98,21 @@ int ORVASchedTaskLoad(int id, Record* task) {
 }
 
 int ORVASchedTaskSave(Record* task) {
-    if (task == nullptr || !IsComplete(task->Data())) {
+    if (task == nullptr) {
+        return Fail(orva::kErrBadArgument);
+    }
+    if (const auto problem = WhatIsMissing(task->Data())) {
+        syslog(LOG_NOTICE, "task refused: %s", problem->c_str());
         return Fail(orva::kErrBadArgument);
     }
     return OrFail([&] {
-        const int id = orva::TaskStore::Current()->Save(task->Data());
+        const std::shared_ptr<orva::TaskStore> store = orva::TaskStore::Current();
         if (task->IsNew()) {
-            task->Write([id](TaskData& data) { data.id = id; });
+            auto created = std::make_shared<TaskData>(task->Data());
+            created->id = store->Save(*created);
+            task->Show(std::move(created));
+        } else {
+            task->Show(store->Change(task->Base(), task->Data()));
         }
         return 0;
     });
@@ -105,7 +130,12 @@ int ORVASchedTaskRun(int id, int reserved1, int reserved2) {
         return Fail(orva::kErrBadArgument);
     }
     return OrFail([&] {
-        orva::TaskStore::Current()->QueueRun(id);
+        try {
+            orva::TaskStore::Current()->QueueRun(id);
+        } catch (const orva::StoreFailure& failure) {
+            syslog(LOG_WARNING, "task %d was not started: %s", id, failure.what());
+            throw;
+        }
         return 0;
     });
 }

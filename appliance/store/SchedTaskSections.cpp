@@ -51,11 +51,12 @@ int ReadBasic(const Json::Value& doc, Record& record) {
         return Refuse(orva::kErrBadDocument, "basic.id: is no decimal id");
     }
     TaskData task;
+    orva::SharedTask stored;
     if (*id == orva::kNewTaskId) {
         task = record.Data();
         task.id = orva::kNewTaskId;
     } else {
-        const orva::SharedTask stored = StoredTask(*id);
+        stored = StoredTask(*id);
         if (stored == nullptr) {
             return -1;
         }
@@ -64,6 +65,9 @@ int ReadBasic(const Json::Value& doc, Record& record) {
     orva::AccountLookup accounts;
     if (const auto problem = orva::ApplyBasicSection(*basic, task, accounts)) {
         return Refuse(problem->code, problem->text);
+    }
+    if (stored != nullptr) {
+        record.Show(std::move(stored));
     }
     record.Write([&task](TaskData& data) { data = std::move(task); });
     return 0;

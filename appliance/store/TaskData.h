@@ -48,6 +48,11 @@ struct TaskData {
     bool operator==(const TaskData&) const = default;
 };
 
+// Does to `task`, which others may have changed meanwhile, the change that led from `base` to
+// `changed`: it takes every property in which the two differ. Each flag is a property of its own;
+// the schedule is one, since its parts only make sense together.
+void ApplyChange(const TaskData& base, const TaskData& changed, TaskData& task);
+
 using SharedTask = std::shared_ptr<const TaskData>;
 
 }  // namespace orva

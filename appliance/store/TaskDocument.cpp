@@ -11,6 +11,7 @@ namespace {
 
 constexpr const char* kBasic = "basic";
 constexpr const char* kSchedule = "schedule";
+constexpr const char* kOwner = "owner";
 constexpr const char* kApp = "app";
 constexpr const char* kAction = "action";
 constexpr const char* kCanEditName = "can_edit_name";
@@ -27,7 +28,7 @@ constexpr std::array<TextMember, 4> kTexts = {{
 }};
 
 constexpr std::array<std::string_view, 7> kBasicMembers = {
-    "id", "task_name", "owner", "enabled", kApp, kAction, kCanEditName};
+    "id", "task_name", kOwner, "enabled", kApp, kAction, kCanEditName};
 
 bool IsBasicMember(std::string_view name) {
     return std::find(kBasicMembers.begin(), kBasicMembers.end(), name) != kBasicMembers.end();
@@ -91,6 +92,9 @@ std::optional<SectionProblem> ApplyBasic(const Json::Value& basic, TaskData& tas
     }
     if (auto problem = ApplyBasicSection(basic, task, accounts)) {
         return problem;
+    }
+    if (task.owner.empty()) {
+        return Refused(prefix + kOwner, "is missing");
     }
     if (auto problem = ApplyText(basic, kApp, prefix, task.app)) {
         return problem;

@@ -34,7 +34,7 @@ void TaskList::Filtered(Filter filter) {
 
 // The filter wrote to the record that it was shown; the list's record shows that.
 void TaskList::KeepWritten(std::uint32_t index, const Record& probe) {
-    RecordAt(index)->Show(std::make_shared<const TaskData>(probe.Data()));
+    RecordAt(index)->ShowSameAs(probe);
 }
 
 TaskList::Record* TaskList::First() { return FromRank(0); }

@@ -16,7 +16,7 @@ const SharedTask& NewTaskDefaults() {
 
 }  // namespace orva
 
-_tag_orva_sched_task_::_tag_orva_sched_task_() : seen(nullptr), flags(0) {
+_tag_orva_sched_task_::_tag_orva_sched_task_() : seen(nullptr), base(nullptr), flags(0) {
     Show(orva::NewTaskDefaults());
 }
 
@@ -24,7 +24,18 @@ void _tag_orva_sched_task_::Show(orva::SharedTask data) {
     LeaveSnapshot();
     shared = std::move(data);
     own = nullptr;
-    seen = shared.get();
+    base = shared.get();
+    seen = base;
+    flags = seen->flags;
+    start = orva::kUnknownStart;
+}
+
+void _tag_orva_sched_task_::ShowSameAs(const _tag_orva_sched_task_& other) {
+    LeaveSnapshot();
+    shared = other.shared;
+    own = other.own == nullptr ? nullptr : std::make_shared<orva::TaskData>(*other.own);
+    base = other.base;
+    seen = own == nullptr ? base : own.get();
     flags = seen->flags;
     start = orva::kUnknownStart;
 }
@@ -33,7 +44,6 @@ orva::TaskData& _tag_orva_sched_task_::Writable() {
     if (own == nullptr) {
         own = std::make_shared<orva::TaskData>(*seen);
         LeaveSnapshot();
-        shared = nullptr;
         seen = own.get();
     }
     return *own;

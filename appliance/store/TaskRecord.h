@@ -13,7 +13,8 @@ class TaskList;
 }
 
 // A task record: a view of shared data until somebody writes to it, of a copy of its own from then
-// on. Records of a list live in the list and look into its snapshot.
+// on. It remembers what it looked at before, so that saving it changes what was written and nothing
+// else. Records of a list live in the list and look into its snapshot.
 struct _tag_orva_sched_task_ {
   public:
     // A new task that looks at shared defaults.
@@ -22,12 +23,19 @@ struct _tag_orva_sched_task_ {
     _tag_orva_sched_task_(orva::TaskList& taskList, std::uint32_t indexInList,
                           const orva::TaskData& data, std::uint16_t taskFlags,
                           orva::StartSecond nextStart)
-        : seen(&data), start(nextStart), list(&taskList), index(indexInList), flags(taskFlags) {}
+        : seen(&data),
+          base(&data),
+          start(nextStart),
+          list(&taskList),
+          index(indexInList),
+          flags(taskFlags) {}
 
     _tag_orva_sched_task_(const _tag_orva_sched_task_&) = delete;
     _tag_orva_sched_task_& operator=(const _tag_orva_sched_task_&) = delete;
 
     const orva::TaskData& Data() const { return *seen; }
+    // What the record looked at before anybody wrote to it.
+    const orva::TaskData& Base() const { return *base; }
     bool Has(orva::TaskFlag flag) const { return (flags & flag) != 0; }
     bool IsNew() const { return seen->id == orva::kNewTaskId; }
     // kUnknownStart unless a list has computed it.
@@ -38,6 +46,9 @@ struct _tag_orva_sched_task_ {
 
     // Looks at `data` from now on.
     void Show(orva::SharedTask data);
+
+    // Has the same base and data as `other`, a record of the same list, from now on.
+    void ShowSameAs(const _tag_orva_sched_task_& other);
 
     // Calls `change(TaskData&)` on a copy of the record's own.
     template <class Change>
@@ -52,8 +63,10 @@ struct _tag_orva_sched_task_ {
     void LeaveSnapshot();
 
     const orva::TaskData* seen;
-    // Null while the record looks into a list's snapshot.
+    const orva::TaskData* base;
+    // Keeps the base alive; null when the list's snapshot does.
     orva::SharedTask shared;
+    // Null until somebody writes.
     std::shared_ptr<orva::TaskData> own;
     orva::StartSecond start = orva::kUnknownStart;
     orva::TaskList* list = nullptr;

@@ -3,7 +3,7 @@
 #include <charconv>
 
 #include "appliance/store/Accounts.h"
-#include "appliance/util/StrictJson.h"
+#include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {
@@ -76,8 +76,11 @@ std::optional<SectionProblem> ApplyOwner(const Json::Value& basic, TaskData& tas
         return Refused(kMember, "is no text");
     }
     const std::string text = owner->asString();
-    const bool changed = text != task.owner;
-    if (stored && changed && !task.Has(kCanEditOwner)) {
+    // An editor sends back what it was given, be the account gone since or not.
+    if (stored && text == task.owner) {
+        return std::nullopt;
+    }
+    if (stored && !task.Has(kCanEditOwner)) {
         return Refused(kMember, "may not be changed", kErrNotAllowed);
     }
     if (!accounts.Exists(text)) {

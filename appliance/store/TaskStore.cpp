@@ -207,6 +207,26 @@ int TaskStore::Save(const TaskData& task) {
     return id;
 }
 
+SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
+    const absl::TimeZone zoneNow = zone.Now();
+    const absl::Time now = options.clock();
+    SharedTask stored = Guarded([&] {
+        WriteTransaction transaction(database);
+        // Read under the write lock: nobody else changes the task from here to the commit.
+        std::optional<TaskData> task = ReadTask(*transaction, base.id);
+        if (task) {
+            ApplyChange(base, changed, *task);
+        }
+        if (!task || !UpdateTask(*transaction, *task, ComputeNextStart(*task, zoneNow, now))) {
+            throw StoreFailure(kErrNotFound, "no task " + std::to_string(base.id));
+        }
+        transaction.Commit();
+        return std::make_shared<const TaskData>(*std::move(task));
+    });
+    SchedulerLink::Wake();
+    return stored;
+}
+
 void TaskStore::Remove(int id) {
     Guarded([&] {
         WriteTransaction transaction(database);
@@ -221,10 +241,10 @@ void TaskStore::Remove(int id) {
 void TaskStore::QueueRun(int id) {
     const SharedTask task = Find(id);
     if (task == nullptr) {
-        throw StoreFailure(kErrNotFound, "no task " + std::to_string(id));
+        throw StoreFailure(kErrNotFound, "there is no such task");
     }
     if (task->command.empty()) {
-        throw StoreFailure(kErrNotAllowed, "task " + std::to_string(id) + " has no command");
+        throw StoreFailure(kErrNotAllowed, "it has no command");
     }
     if (!SchedulerLink::IsAlive()) {
         throw StoreFailure(kErrNoScheduler, "no scheduler is running");
@@ -233,7 +253,7 @@ void TaskStore::QueueRun(int id) {
         WriteTransaction transaction(database);
         if (!orva::QueueRun(*transaction, id, absl::ToUnixSeconds(options.clock()),
                             program_invocation_short_name, OwnAccount())) {
-            throw StoreFailure(kErrNotFound, "no task " + std::to_string(id));
+            throw StoreFailure(kErrNotFound, "there is no such task");
         }
         transaction.Commit();
     });

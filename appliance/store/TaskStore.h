@@ -52,6 +52,11 @@ class TaskStore {
     // task that it is to replace is gone.
     int Save(const TaskData& task);
 
+    // Changes the stored task with the id of `base` in what `changed` differs from `base`, and in
+    // nothing else: what others changed since `base` was read stays. Yields the task as it is
+    // stored now. Fails when it is gone.
+    SharedTask Change(const TaskData& base, const TaskData& changed);
+
     // Fails when there is no such task.
     void Remove(int id);
 

@@ -38,6 +38,9 @@ class Importer {
             }
         }
         const std::optional<std::size_t> at = stored.Find(id);
+        if (!at && id > kHighestImportedId) {
+            return "basic.id: is higher than " + std::to_string(kHighestImportedId);
+        }
         TaskData task = at ? stored.Task(*at) : *NewTaskDefaults();
         if (const auto problem = ApplyTaskDocument(document, task, accounts)) {
             return problem->text;

@@ -11,6 +11,9 @@
 
 namespace orva {
 
+// New tasks are numbered on from the highest id that was ever given. A file must not use them up.
+inline constexpr int kHighestImportedId = 1'000'000'000;
+
 // What ImportTasks did.
 struct ImportResult {
     std::size_t count = 0;
@@ -21,7 +24,8 @@ struct ImportResult {
 
 // Stores the tasks of the array, all or none. A task without an id, or with the id -1, is a new
 // one. The id of a stored task replaces that task. Any other id is kept when it has never been
-// given here, as when a store is copied to an empty appliance; otherwise the task gets a new one.
+// given here, as when a store is copied to an empty appliance, but refused when it is higher than
+// kHighestImportedId; otherwise the task gets a new one.
 ImportResult ImportTasks(TaskStore& store, std::string_view json);
 
 // All tasks by id, indented, ended by a newline.

@@ -18,8 +18,7 @@ namespace {
 
 using Description = std::optional<AppDescription>;
 
-constexpr std::size_t kMaxApps = 512;
-constexpr std::size_t kMaxBytes = 64 << 10;
+constexpr FileCacheLimits kLimits{.files = 512, .totalBytes = 4 << 20, .fileBytes = 64 << 10};
 
 // Whether `path` stays below the folder that it starts from.
 bool LeadsDown(std::string_view path) {
@@ -86,12 +85,8 @@ struct Snapshot {
 }  // namespace
 
 std::optional<AppDescription> ParseAppDescription(const std::string& content, std::string& error) {
-    const std::optional<Json::Value> document = ParseStrictJson(content, error);
+    const std::optional<Json::Value> document = ParseStrictObject(content, error);
     if (!document) {
-        return std::nullopt;
-    }
-    if (!document->isObject()) {
-        error = "the document is no object";
         return std::nullopt;
     }
     const Json::Value* id = FindText(*document, "id");
@@ -108,7 +103,7 @@ std::optional<AppDescription> ParseAppDescription(const std::string& content, st
 }
 
 std::shared_ptr<const std::vector<InstalledApp>> FindInstalledApps(const std::string& directory) {
-    static FileCache<Description> cache(kMaxApps, kMaxBytes, true, ParseAndLog);
+    static FileCache<Description> cache(kLimits, true, ParseAndLog);
     static Snapshot snapshot;
 
     auto folders = snapshot.directories.Get(directory);

@@ -1,6 +1,5 @@
 #include <syslog.h>
 
-#include <cstddef>
 #include <memory>
 #include <string>
 
@@ -12,9 +11,10 @@
 namespace ORVA::ZUM {
 namespace {
 
-// The languages in use and the applications with texts of their own, with room to spare.
-constexpr std::size_t kMaxFiles = 64;
-constexpr std::size_t kMaxBytes = 4 << 20;
+// A list asks for the texts of every application that it names, in its reader's language; a cache
+// that holds fewer would parse all of them again for each list.
+constexpr orva::FileCacheLimits kLimits{
+    .files = 4096, .totalBytes = 16 << 20, .fileBytes = 4 << 20};
 
 Json::Value ParseAndLog(const std::string& content, const std::string& path) {
     std::string error;
@@ -28,7 +28,7 @@ Json::Value ParseAndLog(const std::string& content, const std::string& path) {
 }  // namespace
 
 Json::Value LocalizedStringParser::ParseTexts(const std::string& directory) const {
-    static orva::FileCache<Json::Value> cache(kMaxFiles, kMaxBytes, false, ParseAndLog);
+    static orva::FileCache<Json::Value> cache(kLimits, false, ParseAndLog);
     const std::shared_ptr<const Json::Value> texts =
         cache.Get(orva::ResolvePath(directory) + "/strings.json");
     return texts != nullptr ? *texts : Json::Value(Json::objectValue);

@@ -1,43 +1,68 @@
 #include "appliance/texts/TextFile.h"
 
+#include <json/writer.h>
+
+#include <cstddef>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include "appliance/util/StrictJson.h"
 
 namespace orva {
 namespace {
 
-// What keeps `document` from being sections of texts; empty when nothing does.
-std::string FindFault(const Json::Value& document) {
-    if (!document.isObject()) {
-        return "the document is no object";
+// Removes the members of `object` that are not of `type`; gives their names.
+std::vector<std::string> RemoveOthers(Json::Value& object, Json::ValueType type) {
+    std::vector<std::string> names;
+    for (auto member = object.begin(); member != object.end(); ++member) {
+        if (member->type() != type) {
+            names.push_back(member.name());
+        }
+    }
+    for (const std::string& name : names) {
+        object.removeMember(name);
+    }
+    return names;
+}
+
+// On one line, whatever the name holds.
+std::string Quoted(const std::string& name) { return Json::valueToQuotedString(name.c_str()); }
+
+// Removes what is no section of texts and no text. One line about it; empty when all is well.
+std::string RemoveFaults(Json::Value& document) {
+    std::string first;
+    std::size_t count = 0;
+    const std::vector<std::string> sections = RemoveOthers(document, Json::objectValue);
+    if (!sections.empty()) {
+        first = "section " + Quoted(sections.front()) + " is no object";
+        count = sections.size();
     }
     for (auto section = document.begin(); section != document.end(); ++section) {
-        if (!section->isObject()) {
-            return "section \"" + section.name() + "\" is no object";
+        const std::vector<std::string> keys = RemoveOthers(*section, Json::stringValue);
+        if (first.empty() && !keys.empty()) {
+            first = Quoted(section.name() + ":" + keys.front()) + " is no text";
         }
-        for (auto text = section->begin(); text != section->end(); ++text) {
-            if (!text->isString()) {
-                return "\"" + section.name() + ":" + text.name() + "\" is no text";
-            }
-        }
+        count += keys.size();
     }
-    return {};
+    if (count > 1) {
+        first += " (faults in all: " + std::to_string(count) + ")";
+    }
+    return first;
 }
 
 }  // namespace
 
 Json::Value ParseTextFile(const std::string& content, std::string& error) {
-    std::optional<Json::Value> document = ParseStrictJson(content, error);
-    if (document) {
-        std::string fault = FindFault(*document);
-        if (fault.empty()) {
-            return std::move(*document);
-        }
+    std::optional<Json::Value> document = ParseStrictObject(content, error);
+    if (!document) {
+        return Json::Value(Json::objectValue);
+    }
+    std::string fault = RemoveFaults(*document);
+    if (!fault.empty()) {
         error = std::move(fault);
     }
-    return Json::Value(Json::objectValue);
+    return std::move(*document);
 }
 
 }  // namespace orva

@@ -17,9 +17,15 @@
 
 namespace orva {
 
+struct FileCacheLimits {
+    std::size_t files;       // how many are remembered, missing ones too; at least 1
+    std::size_t totalBytes;  // how much the remembered ones hold together, as files
+    std::size_t fileBytes;   // a larger file counts as one that cannot be read
+};
+
 // Parsed files, each parsed once per version of it and shared by everybody who asks while it stays
-// the same. A changed file is seen by the next Get. At most `capacity` files are remembered; the
-// one that was asked for least recently is forgotten first.
+// the same. A changed file is seen by the next Get. Beyond its limits the cache forgets the file
+// that was asked for least recently.
 //
 // A file that cannot be read is logged once for each reason, not at each Get; one that does not
 // exist only where `logMissing` asks for it. What a file holds is for the parse function to log: it
@@ -32,11 +38,8 @@ class FileCache {
     // Makes of a file's bytes what callers get; may log, should not throw.
     using Parse = std::function<Parsed(const std::string& content, const std::string& path)>;
 
-    FileCache(std::size_t capacity, std::size_t maxFileBytes, bool logMissing, Parse parse)
-        : maxFiles(capacity),
-          limit(maxFileBytes),
-          logsMissing(logMissing),
-          parser(std::move(parse)) {}
+    FileCache(const FileCacheLimits& maxima, bool logMissing, Parse parse)
+        : limits(maxima), logsMissing(logMissing), parser(std::move(parse)) {}
 
     // The parsed file at `path`; null when it does not exist or cannot be read.
     std::shared_ptr<const Parsed> Get(const std::string& path) {
@@ -70,6 +73,7 @@ class FileCache {
         // within the same step of the file system's clock.
         std::string content;
         int loggedError = 0;
+        std::size_t bytes = 0;  // what it adds to `total`; guarded by the cache's mutex
     };
     using Recent = std::list<std::pair<std::string, std::shared_ptr<Entry>>>;
 
@@ -81,17 +85,35 @@ class FileCache {
         }
         recent.emplace_front(path, std::make_shared<Entry>());
         entries.emplace(path, recent.begin());
-        if (entries.size() > maxFiles) {
+        ForgetOldest();
+        return recent.front().second;
+    }
+
+    // Takes note that the file of `entry` has `bytes` bytes now.
+    void Weigh(Entry& entry, const std::string& path, std::size_t bytes) {
+        const std::lock_guard lock(mutex);
+        const auto found = entries.find(path);
+        if (found == entries.end() || found->second->second.get() != &entry) {
+            return;  // forgotten while it was read
+        }
+        total = total - entry.bytes + bytes;
+        entry.bytes = bytes;
+        ForgetOldest();
+    }
+
+    // The cache's mutex is held.
+    void ForgetOldest() {
+        while (entries.size() > limits.files || total > limits.totalBytes) {
+            total -= recent.back().second->bytes;
             entries.erase(recent.back().first);
             recent.pop_back();
         }
-        return recent.front().second;
     }
 
     void Read(Entry& entry, const std::string& path) {
         std::string content;
         FileIdentity identity;
-        if (const int error = ReadFile(path, limit, content, identity)) {
+        if (const int error = ReadFile(path, limits.fileBytes, content, identity)) {
             Forget(entry, path, error);
             return;
         }
@@ -103,12 +125,14 @@ class FileCache {
             entry.identity = identity;
         }
         entry.settled = identity.IsSettled();
+        Weigh(entry, path, content.size());
         entry.content = entry.settled ? std::string() : std::move(content);
     }
 
     std::shared_ptr<const Parsed> Forget(Entry& entry, const std::string& path, int error) {
         entry.value = nullptr;
         entry.content = std::string();
+        Weigh(entry, path, 0);
         const bool missing = error == ENOENT || error == ENOTDIR;
         if (error != entry.loggedError && (logsMissing || !missing)) {
             ::syslog(LOG_ERR, "%s: %s", path.c_str(),
@@ -118,13 +142,13 @@ class FileCache {
         return nullptr;
     }
 
-    const std::size_t maxFiles;
-    const std::size_t limit;
+    const FileCacheLimits limits;
     const bool logsMissing;
     const Parse parser;
 
     mutable std::mutex mutex;
     Recent recent;  // the one asked for last comes first
+    std::size_t total = 0;
     std::unordered_map<std::string, typename Recent::iterator> entries;
 };
 

@@ -2,7 +2,7 @@
 
 #include <cstddef>
 
-#include "appliance/util/StrictJson.h"
+#include "appliance/util/Utf8.h"
 
 namespace orva {
 

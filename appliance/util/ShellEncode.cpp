@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <cstddef>
 #include <cstring>
 #include <string_view>
@@ -92,10 +93,12 @@ bool InDoubleQuotes(std::string_view text, Writer writer) {
 
 int QLIBCEncShParam(const char* text, char* buffer, int size) {
     if (buffer == nullptr || size <= 0) {
+        errno = EINVAL;
         return orva::Fail(orva::kErrBadArgument);
     }
     buffer[0] = '\0';
     if (text == nullptr) {
+        errno = EINVAL;
         return orva::Fail(orva::kErrBadArgument);
     }
     const std::string_view word(text);
@@ -105,5 +108,6 @@ int QLIBCEncShParam(const char* text, char* buffer, int size) {
         return 0;
     }
     buffer[0] = '\0';
+    errno = ERANGE;
     return orva::Fail(orva::kErrTooLong);
 }

@@ -20,8 +20,8 @@ namespace orva {
 // Threads: any.
 [[nodiscard]] std::optional<Json::Value> ParseStrictJson(std::string_view text, std::string& error);
 
-// The length in bytes of the longest start of `text` that is valid UTF-8: `text.size()` when all of
-// it is. Surrogates, over-long forms and what lies beyond U+10FFFF are invalid.
-[[nodiscard]] std::size_t ValidUtf8Length(std::string_view text);
+// As ParseStrictJson, but a document that is no object is a failure too.
+[[nodiscard]] std::optional<Json::Value> ParseStrictObject(std::string_view text,
+                                                           std::string& error);
 
 }  // namespace orva

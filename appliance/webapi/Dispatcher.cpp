@@ -60,7 +60,9 @@ ApiAnswer Dispatcher::Call(std::string_view api, std::int32_t version, std::stri
         }
         ORVA::APIRequest request(std::move(*parameters), language);
         result.function(&request, &answer.response);
-    } catch (const Json::Exception&) {
+    } catch (const Json::Exception& exception) {
+        // Mostly the caller's doing, but a damaged stored document ends here too.
+        LogFailure(api, version, method, exception.what());
         return MakeErrorAnswer(400, ApiError::kWrongType, "a parameter has the wrong type");
     } catch (const std::exception& exception) {
         LogFailure(api, version, method, exception.what());

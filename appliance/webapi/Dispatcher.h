@@ -25,8 +25,9 @@ class Dispatcher {
 
     // Parses `body` and calls the method with it. `language` has been checked (see Language.h).
     // Whatever happens inside the method, this answers: 400 when the body is not a JSON object, or
-    // when the method's own work with the document threw because a parameter has another type; 500,
-    // with a log line, for any other exception and for a method that set nothing.
+    // when the method's own work with the document threw because a parameter has another type; 500
+    // for any other exception and for a method that set nothing. What a method threw, and that it
+    // set nothing, is one line in the log.
     ApiAnswer Call(std::string_view api, std::int32_t version, std::string_view method,
                    std::string_view body, const std::string& language) const;
 

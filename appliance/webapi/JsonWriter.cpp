@@ -5,7 +5,7 @@
 #include <cmath>
 #include <string_view>
 
-#include "appliance/util/StrictJson.h"
+#include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {

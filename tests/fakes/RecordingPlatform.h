@@ -47,6 +47,8 @@ struct Task {
 
     // Every property on one line, in the order above from `name` to `schedule`.
     std::string ToText() const;
+
+    bool operator==(const Task&) const = default;
 };
 
 struct LastError {

@@ -73,6 +73,8 @@ TEST_F(AppParserTest, LooksNothingUpForWhatIsNoKey) {
     const AppParser parser("enu");
     platform.ClearJournal();
     EXPECT_EQ(parser.GetString("com.example.Notes", "#common:run"), "#common:run");
+    EXPECT_EQ(parser.GetString("com.example.Notes", "#common#"), "#common#");
+    EXPECT_EQ(parser.GetString("com.example.Notes", "common:run"), "common:run");
     EXPECT_THAT(platform.FullJournal(), ElementsAre());
 }
 

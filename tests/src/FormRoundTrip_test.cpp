@@ -15,6 +15,8 @@ namespace {
 
 constexpr unsigned kSeed = 20260717;
 constexpr int kRounds = 4000;
+// Levels of nesting that jsoncpp's reader does not take.
+constexpr int kTooDeep = 1500;
 
 constexpr const char* kKinds[] = {"beep", "script", "service", "recycle"};
 
@@ -95,7 +97,7 @@ class FormRoundTrip : public ModuleTest {
         switch (Below(3)) {
             case 0:
                 files["policy"] = "size";
-                files["size"] = static_cast<int>(random());
+                files["size"] = static_cast<Json::Int64>(random());
                 files["sort_type"] = Below(2);
                 break;
             case 1:
@@ -323,8 +325,11 @@ TEST_F(FormRoundTrip, DamagedStoredSectionsNeverEndInAnException) {
         parameters["type"] = kKinds[chosen];
         const int id = Result(Call("create", Compact(parameters)))["id"].asInt();
         Task& task = platform.tasks[id];
-        if (Below(4) == 0) {
+        const int damage = Below(8);
+        if (damage < 2) {
             task.appArgs.resize(task.appArgs.size() / 2);
+        } else if (damage == 2) {
+            task.appArgs = std::string(kTooDeep, '[');
         } else {
             Json::Value section = Document(task.appArgs);
             SomewhereIn(section) = Anything();
@@ -334,12 +339,32 @@ TEST_F(FormRoundTrip, DamagedStoredSectionsNeverEndInAnException) {
         ASSERT_EQ(task.app, namespaces[chosen]);
         const std::string stored = task.appArgs;
         ASSERT_NO_THROW(Call("get", "{\"id\":" + std::to_string(id) + "}")) << stored;
-        if (kKinds[chosen] == std::string("service") || kKinds[chosen] == std::string("recycle")) {
-            ASSERT_NO_THROW(Call("set", "{\"id\":" + std::to_string(id) + "}")) << stored;
-        }
+        ASSERT_NO_THROW(Call("set", "{\"id\":" + std::to_string(id) + "}")) << stored;
         ASSERT_EQ(platform.Leftovers(), "") << stored;
         platform.tasks.clear();
         platform.ClearJournal();
+    }
+}
+
+TEST_F(FormRoundTrip, StoredSectionsNestedTooDeepCountAsEmptyOnes) {
+    const std::vector<std::string> namespaces = {
+        "ORVA.ZUM.TaskScheduler.Beep", "ORVA.ZUM.TaskScheduler.Script",
+        "ORVA.ZUM.TaskScheduler.Service", "ORVA.ZUM.TaskScheduler.Recycle"};
+    const std::vector<std::string> shown = {
+        "null", "null", R"(error 117 {"msg":"Failed to convert app object"})",
+        R"({"clean_file_policy":{"policy":"clean_all","reserve_policy":{"extension_check":false,)"
+        R"("size_greater_check":false,"size_smaller_check":false}},)"
+        R"("clean_share_policy":{"clean_all":false,"shares":null}})"};
+    const std::vector<std::string> set = {R"(success {"id":5})", R"(success {"id":5})",
+                                          R"(error 117 {"msg":"Invalid (app) object"})",
+                                          R"(error 117 {"msg":"Invalid (app) object"})"};
+    for (std::size_t kind = 0; kind < namespaces.size(); ++kind) {
+        platform.AddTask(StoredTask(5, namespaces[kind], std::string(kTooDeep, '[')));
+        const std::string answer = Call("get", R"({"id":5})");
+        const Json::Value document = Result(answer);
+        EXPECT_EQ(document.isNull() ? answer : Compact(document["extra"]), shown[kind])
+            << kKinds[kind];
+        EXPECT_EQ(Call("set", R"({"id":5,"name":"Job","extra":{}})"), set[kind]) << kKinds[kind];
     }
 }
 

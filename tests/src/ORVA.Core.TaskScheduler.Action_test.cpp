@@ -105,6 +105,20 @@ TEST_F(TranslateActionKeyTest, ReplacesTheFirstOccurrenceThatTheOutputHas) {
     EXPECT_EQ(Action("#a:self# #a:b#"), "again AB #a:b#");
 }
 
+TEST_F(TranslateActionKeyTest, AsksForNothingWhenTheActionHoldsNoKey) {
+    platform.appTexts["com.example.Notes"] = "apps/notes";
+    for (const std::string action :
+         {"", "plain: text", "#common#", ":#ab#", "#a:b", "a:b#", "##"}) {
+        platform.ClearJournal();
+        EXPECT_EQ(Action(action, "com.example.Notes"), action);
+        EXPECT_THAT(platform.TextsJournal(),
+                    ElementsAre("OrvaConf()", "JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
+                                "JSConfigParser::GetTexts()",
+                                "ParseTexts(\"/usr/orva/orvaman/webman/texts/enu\")"))
+            << action;
+    }
+}
+
 TEST_F(TranslateActionKeyTest, AsksForEveryOccurrenceOfAKeyOfTheOwningApplication) {
     platform.appTexts["com.example.Notes"] = "apps/notes";
     platform.texts["/usr/orva/orvaman/webman/apps/notes"] =

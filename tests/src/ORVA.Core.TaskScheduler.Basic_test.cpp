@@ -1,5 +1,7 @@
 #include "include/TaskSchedulerBasicHandler.h"
 
+#include <cstddef>
+#include <cstring>
 #include <stdexcept>
 #include <string>
 #include <type_traits>
@@ -394,8 +396,7 @@ TEST_F(BasicHandler, SetThatCannotBeSavedIsLoggedAndAnswered) {
     EXPECT_EQ(platform.tasks[5].name, "Job");
 }
 
-// --- The section as it is stored now
-// --------------------------------------------------------------
+// --- The section as it is stored now -------------------------------------------------------------
 
 class StoredSection : public BasicHandler {
   protected:
@@ -499,6 +500,24 @@ TEST_F(BasicHandler, OnlyScriptTasksMayChangeTheirOwner) {
     EXPECT_TRUE(TaskSchedulerScriptHandler(&request, &response).GetAppEditOwnerValue());
     EXPECT_FALSE(TaskSchedulerRecycleHandler(&request, &response).GetAppEditOwnerValue());
     EXPECT_FALSE(TaskSchedulerServiceHandler(&request, &response).GetAppEditOwnerValue());
+}
+
+// The place of a virtual operation in the dispatch table, as its pointer tells: the first word
+// holds the place in bytes, on some machines with the lowest bit set.
+template <class Operation>
+std::size_t SlotOf(Operation operation) {
+    std::size_t word = 0;
+    static_assert(sizeof(operation) == 2 * sizeof(word));
+    std::memcpy(&word, &operation, sizeof(word));
+    return word / sizeof(void*);
+}
+
+TEST_F(BasicHandler, TheFiveOperationsOfAKindStandInTheDispatchTableInTheirOrder) {
+    EXPECT_EQ(SlotOf(&TaskSchedulerBasicHandler::ConvertToJson_App), 0U);
+    EXPECT_EQ(SlotOf(&TaskSchedulerBasicHandler::ConvertFromJson_App), 1U);
+    EXPECT_EQ(SlotOf(&TaskSchedulerBasicHandler::ReConstructJsonGet_App), 2U);
+    EXPECT_EQ(SlotOf(&TaskSchedulerBasicHandler::ReConstructJsonSet_App), 3U);
+    EXPECT_EQ(SlotOf(&TaskSchedulerBasicHandler::GetAppEditOwnerValue), 4U);
 }
 
 TEST_F(BasicHandler, KindsAddNoFieldsAndNoVirtualDestructor) {

@@ -66,6 +66,13 @@ TEST_F(ListTest, LeavesOutTasksThatAreNotListable) {
     EXPECT_EQ(document["total"], 2);
 }
 
+TEST_F(ListTest, FreesNothingWhenNoStoredTaskIsListable) {
+    Add(1).listable = false;
+    Add(2).listable = false;
+    EXPECT_EQ(Call("list", "{}"), R"(success {"tasks":[],"total":0})");
+    EXPECT_THAT(platform.Journal(), ElementsAre("ORVASchedTaskListGet(null, filter)"));
+}
+
 TEST_F(ListTest, ShowsEveryMemberOfATask) {
     fakes::Task& task = Add(7);
     task.name = "Morning \"beep\" ä";

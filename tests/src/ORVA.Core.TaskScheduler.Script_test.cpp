@@ -121,6 +121,16 @@ TEST_F(ScriptTask, AScriptThatIsNoTextEndsAsAnExceptionWithNothingSaved) {
     EXPECT_EQ(platform.tasks[5].appArgs, "{\"script\":\"true\"}\n");
 }
 
+TEST_F(ScriptTask, AFailingSetterIsPassedOver) {
+    ExpectFailingSettersArePassedOver(
+        {"ORVASchedCTaskSetEditForm", "ORVASchedCTaskSetSimpleEditForm",
+         "ORVASchedCTaskSetCanEditName", "ORVASchedCTaskSetCanEditOwner",
+         "ORVASchedCTaskSetCanRunTaskSameTime", "ORVASchedCTaskSetCanRunAppSameTime",
+         "ORVASchedCTaskSetListable", "ORVASchedCTaskSetAppName", "ORVASchedCTaskSetApp",
+         "ORVASchedCTaskSetAppArgs", "ORVASchedCTaskSetAction", "ORVASchedCTaskSetCommand"},
+        [] { return SetExtra(R"({"script":"date"})"); });
+}
+
 TEST_F(ScriptTask, AnExceptionFromASetterFreesTheRecord) {
     platform.ThrowFrom("ORVASchedCTaskSetAppArgs");
     EXPECT_THROW(SetExtra(R"({"script":"date"})"), std::runtime_error);

@@ -390,13 +390,49 @@ TEST_F(ServiceTask, AFormThatIsNoObjectEndsAsAnExceptionWithNothingSaved) {
 }
 
 TEST_F(ServiceTask, SetAnswersWhatKeptTheStoredSectionAway) {
+    constexpr const char* kRefused =
+        "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:222 Convert task from json (app) failed. "
+        "[0x0900 platform.cpp:42]";
     platform.FailCall("ORVASchedTaskAlloc");
     EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Failed to allocate task"})");
+    EXPECT_THAT(platform.Journal(),
+                ElementsAre("ORVASchedTaskAlloc()",
+                            "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:102 alloc task failed. "
+                            "id:[5] [0x0900 platform.cpp:42]",
+                            kRefused));
+    platform.ClearJournal();
     platform.FailCall("ORVASchedTaskLoad");
     EXPECT_EQ(SetForm("{}"), R"(error 4801 {"msg":"Failed to load task"})");
+    EXPECT_THAT(platform.Journal(),
+                ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, #1)",
+                            "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:108 load task failed. "
+                            "id:[5] [0x0900 platform.cpp:42]",
+                            "ORVASchedTaskFree(#1)", kRefused));
+    platform.ClearJournal();
     platform.FailCall("QLIBCSzHashAlloc");
     EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Failed to convert app object"})");
-    EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+    EXPECT_THAT(
+        platform.Journal(),
+        ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, #2)", "PackageManager::init()",
+                    "PackageManager::enumPackages(null)",
+                    R"(PackageManager::getPackageInfo("mail", null))",
+                    R"(PackageManager::getPackageInfo("photo", null))", "QLIBCSzHashAlloc(128)",
+                    "LOG_ERR ORVA.Core.TaskScheduler.Service.cpp:168 hash alloc failed",
+                    "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:114 convert task to json (app) "
+                    "faield. id:[5] [0x0900 platform.cpp:42]",
+                    "ORVASchedTaskFree(#2)", kRefused));
+    EXPECT_EQ(Stored().appArgs, kStored);
+}
+
+TEST_F(ServiceTask, SetWithoutMemoryForTheSecondRecordIsLoggedAndAnswered) {
+    platform.FailCall("ORVASchedTaskAlloc", 2);
+    EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Failed to new task"})");
+    std::vector<std::string> journal = platform.Journal();
+    ASSERT_GT(journal.size(), 4U);
+    EXPECT_THAT(std::vector<std::string>(journal.end() - 4, journal.end()),
+                ElementsAre("QLIBCSzHashFree(#1)", "ORVASchedTaskFree(#1)", "ORVASchedTaskAlloc()",
+                            "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:229 Failed to new task. "
+                            "[0x0900 platform.cpp:42]"));
 }
 
 // --- The catalogue -------------------------------------------------------------------------------
@@ -564,6 +600,15 @@ TEST_F(ServiceTask, TheRefreshAsksTheHashOncePerEntry) {
     EXPECT_EQ(platform.Calls("QLIBCSzHashGetValue"), 2000);
     EXPECT_EQ(platform.Calls("QLIBCSzHashSetValue"), 2000);
     EXPECT_EQ(platform.Calls("PackageManager::getPackageInfo"), 1000);
+}
+
+TEST_F(ServiceTask, AFailingSetterIsPassedOver) {
+    ExpectFailingSettersArePassedOver(
+        {"ORVASchedCTaskSetEditForm", "ORVASchedCTaskSetCanEditOwner",
+         "ORVASchedCTaskSetCanRunAppSameTime", "ORVASchedCTaskSetCanRunTaskSameTime",
+         "ORVASchedCTaskSetApp", "ORVASchedCTaskSetAppName", "ORVASchedCTaskSetAppArgs",
+         "ORVASchedCTaskSetAction", "ORVASchedCTaskSetCommand"},
+        [] { return SetForm("{}"); });
 }
 
 TEST_F(ServiceTask, AnExceptionFromThePlatformFreesRecordsAndHashes) {

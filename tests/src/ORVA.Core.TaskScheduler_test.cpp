@@ -104,6 +104,22 @@ TEST_F(HandlerTest, SendsDetailsWithoutAMessageAsTheyAre) {
     EXPECT_EQ(fakes::Answer(response), R"(error 4800 {"field":"id"})");
 }
 
+TEST_F(HandlerTest, KeepsTheDetailsOfCodeZeroUntilOthersAreGiven) {
+    TaskSchedulerHandler handler(&request, &response);
+    handler.SetError(0, "x", fakes::Document(R"({"k": 1})"));
+    handler.SetError(4800, "y");
+    handler.ReportError();
+    EXPECT_EQ(fakes::Answer(response), R"(error 4800 {"k":1,"msg":"y"})");
+}
+
+TEST_F(HandlerTest, ReplacesTheDetailsOfCodeZeroByTheFirstErrorsOwn) {
+    TaskSchedulerHandler handler(&request, &response);
+    handler.SetError(0, "x", fakes::Document(R"({"k": 1})"));
+    handler.SetError(4800, "y", fakes::Document(R"({"z": 2})"));
+    handler.ReportError();
+    EXPECT_EQ(fakes::Answer(response), R"(error 4800 {"msg":"y","z":2})");
+}
+
 TEST_F(HandlerTest, ReportsCodeZeroWhenNoErrorWasRecorded) {
     TaskSchedulerHandler handler(&request, &response);
     handler.ReportError();
@@ -407,6 +423,18 @@ TEST_F(SetEnableTest, StopsAtTheFirstTaskThatCannotBeSavedAndKeepsWhatWasDone) {
     EXPECT_FALSE(platform.tasks[3].enabled);
     EXPECT_TRUE(platform.tasks[4].enabled);
     EXPECT_TRUE(platform.tasks[5].enabled);
+}
+
+TEST_F(SetEnableTest, CannotSaveTheRecordOfANewTask) {
+    EXPECT_EQ(Call("set_enable", R"({"status": [{"id": -1, "enable": true}]})"),
+              R"(error 4804 {"msg":"Failed to update task"})");
+    EXPECT_THAT(platform.Journal(),
+                ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(-1, #1)",
+                            "ORVASchedCTaskSetState(#1, 1)", "ORVASchedTaskSave(#1)",
+                            "LOG_ERR ORVA.Core.TaskScheduler.cpp:335 Failed to upadte task -1. "
+                            "[0x0300 store.cpp:1]",
+                            "ORVASchedTaskFree(#1)"));
+    EXPECT_EQ(platform.tasks.size(), 4U);
 }
 
 TEST_F(SetEnableTest, DoesNotLookAtTheOutcomeOfSettingTheState) {

@@ -145,6 +145,95 @@ TEST_F(TypedMethodTest, GetAnswersThatATaskCannotBeFound) {
                             "ORVASchedTaskFree(#1)"));
 }
 
+TEST_F(TypedMethodTest, GetAndSetAnswerThatTheKindCannotBeFoundWithoutAMessage) {
+    Add(5, "ORVA.ZUM.TaskScheduler.Recycle", "{}");
+    for (const std::string method : {"get", "set"}) {
+        platform.ClearJournal();
+        platform.FailCall("ORVASchedTaskAlloc");
+        EXPECT_EQ(Call(method, R"({"id": 5})"), "error 4801 null") << method;
+        EXPECT_THAT(platform.FullJournal(),
+                    ElementsAre("ORVASchedTaskAlloc()",
+                                "LOG_ERR lib.cpp:38 alloc task failed. id:[5] "
+                                "[0x0900 platform.cpp:42]"))
+            << method;
+    }
+}
+
+TEST_F(TypedMethodTest, GetAndSetAnswerThatTheKindCannotBeConvertedWithoutAMessage) {
+    Add(5, "ORVA.ZUM.TaskScheduler.Recycle", "{}");
+    for (const auto& [method, record] :
+         std::vector<std::pair<std::string, std::string>>{{"get", "#1"}, {"set", "#2"}}) {
+        platform.ClearJournal();
+        platform.FailCall("ORVASchedTaskConvertToJson_Basic");
+        EXPECT_EQ(Call(method, R"({"id": 5})"), "error 4801 null") << method;
+        EXPECT_THAT(platform.FullJournal(),
+                    ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, " + record + ")",
+                                "ORVASchedTaskConvertToJson_Basic(" + record + ")",
+                                "LOG_ERR lib.cpp:48 convert task to json (basic) faield. id:[5] "
+                                "[0x0900 platform.cpp:42]",
+                                "ORVASchedTaskFree(" + record + ")"))
+            << method;
+    }
+}
+
+// Somebody deletes the task after its kind was found.
+TEST_F(TypedMethodTest, GetOfATaskThatVanishesMeanwhileIsAnsweredWithAMessage) {
+    Add(5, "ORVA.ZUM.TaskScheduler.Script", "{}");
+    platform.FailCall("ORVASchedTaskLoad", 2, {0x0300, "store.cpp", 1});
+    EXPECT_EQ(Call("get", R"({"id": 5})"), R"(error 4801 {"msg":"Failed to load task"})");
+    EXPECT_THAT(platform.Journal(),
+                ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, #1)",
+                            "ORVASchedTaskConvertToJson_Basic(#1)", "ORVASchedTaskFree(#1)",
+                            "ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, #2)",
+                            "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:150 load task failed. "
+                            "id:[5] [0x0300 store.cpp:1]",
+                            "ORVASchedTaskFree(#2)"));
+}
+
+TEST_F(TypedMethodTest, SetOfATaskThatVanishesMeanwhileIsAnsweredWithAMessage) {
+    for (const auto& [kind, record] :
+         std::vector<std::pair<std::string, int>>{{"Recycle", 1}, {"Service", 3}}) {
+        const std::string first = "#" + std::to_string(record);
+        const std::string second = "#" + std::to_string(record + 1);
+        Add(5, "ORVA.ZUM.TaskScheduler." + kind, "{}");
+        platform.ClearJournal();
+        platform.FailCall("ORVASchedTaskLoad", 2, {0x0300, "store.cpp", 1});
+        EXPECT_EQ(Call("set", R"({"id": 5, "name": "edited", "extra": {}})"),
+                  R"(error 4801 {"msg":"Failed to load task"})")
+            << kind;
+        EXPECT_THAT(
+            platform.Journal(),
+            ElementsAre("ORVASchedTaskAlloc()", "ORVASchedTaskLoad(5, " + first + ")",
+                        "ORVASchedTaskConvertToJson_Basic(" + first + ")",
+                        "ORVASchedTaskFree(" + first + ")", "ORVASchedTaskAlloc()",
+                        "ORVASchedTaskLoad(5, " + second + ")",
+                        "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:108 load task failed. id:[5] "
+                        "[0x0300 store.cpp:1]",
+                        "ORVASchedTaskFree(" + second + ")",
+                        "LOG_ERR ORVA.Core.TaskScheduler.Basic.cpp:222 Convert task from json "
+                        "(app) failed. [0x0300 store.cpp:1]"))
+            << kind;
+        EXPECT_EQ(platform.tasks[5].name, "task 5") << kind;
+    }
+}
+
+TEST_F(TypedMethodTest, GetOfMinusOneWithoutATypeAnswersTheBlankFormOfACustomTask) {
+    EXPECT_EQ(Call("get", R"({"id": -1})"),
+              R"(success {"action":"","can_edit_name":true,"can_edit_owner":false,"enable":true,)"
+              R"("extra":null,"id":-1,"name":"","owner":"admin",)"
+              R"("schedule":{"minute":null,"repeat_date":null,"week_day":null},)"
+              R"("type":"custom"})");
+}
+
+TEST_F(TypedMethodTest, SetOfMinusOneCannotBeSaved) {
+    EXPECT_EQ(Call("set", R"({"id": -1, "name": "new", "extra": {"script": "date"}})"),
+              R"(error 117 {"msg":"Failed to save task"})");
+    EXPECT_THAT(platform.Log(), ElementsAre("ORVA.Core.TaskScheduler.Basic.cpp:251 Save task "
+                                            "failed. [0x0300 store.cpp:1]"));
+    EXPECT_EQ(platform.Calls("ORVASchedTaskFree"), 2);
+    EXPECT_THAT(platform.tasks, IsEmpty());
+}
+
 TEST_F(TypedMethodTest, SetRefusesAMissingOrMalformedId) {
     Add(5, "ORVA.ZUM.TaskScheduler.Script", "{}");
     for (const std::string parameters :
@@ -264,6 +353,143 @@ TEST_F(TypedMethodTest, CreateMakesATaskOfTheAskedKind) {
                                  std::string(kEdited) + "}"),
               R"(success {"id":101})");
     EXPECT_EQ(platform.tasks[101].app, "ORVA.ZUM.TaskScheduler.Beep");
+}
+
+TEST_F(TypedMethodTest, CreateWithTheIdOfAnotherKindsTaskTurnsItIntoTheCreatedKind) {
+    for (const auto& [type, kind] :
+         std::vector<std::pair<std::string, std::string>>{{"beep", "Beep"},
+                                                          {"script", "Script"},
+                                                          {"service", "Service"},
+                                                          {"recycle", "Recycle"}}) {
+        Add(5, "com.example.Notes",
+            R"({"service_action": "0", "recycle_action": "2", "clean_all": "yes",
+                "service_store": [{"name": "NTP", "enabled": true, "service_type": 1}]})");
+        EXPECT_EQ(
+            Call("create", R"({"id": 5, "extra": {}, "type": ")" + type + "\"," + kEdited + "}"),
+            R"(success {"id":5})")
+            << type;
+        EXPECT_EQ(platform.tasks.size(), 1U) << type;
+        EXPECT_EQ(platform.tasks[5].name, "edited") << type;
+        EXPECT_EQ(platform.tasks[5].app, "ORVA.ZUM.TaskScheduler." + kind) << type;
+        EXPECT_EQ(platform.tasks[5].editForm, "ORVA.ZUM.TaskScheduler." + kind + ".FormPanel")
+            << type;
+    }
+}
+
+TEST_F(TypedMethodTest, CreateWithTheIdOfNoTaskMakesNone) {
+    EXPECT_EQ(Call("create", R"({"id": 9, "type": "script", "name": "new"})"),
+              R"(error 117 {"msg":"Invalid (basic) object"})");
+    EXPECT_THAT(platform.tasks, IsEmpty());
+}
+
+// --- Failures of create -------------------------------------------------------------------------
+
+struct CreateFailure {
+    std::string function;
+    int call;
+    std::string answer;
+    std::vector<std::string> log;
+    int frees;
+};
+
+class FailedCreateTest : public TypedMethodTest {
+  protected:
+    // Whether a create of this kind answers and logs each failure, frees what it took and stores
+    // nothing.
+    void ExpectFailures(const std::string& type, const std::vector<CreateFailure>& failures) {
+        for (const CreateFailure& failure : failures) {
+            platform.ClearJournal();
+            platform.FailCall(failure.function, failure.call);
+            EXPECT_EQ(Call("create", R"({"extra": {}, "type": ")" + type + "\"," + kEdited + "}"),
+                      failure.answer)
+                << type;
+            EXPECT_EQ(platform.Log(), failure.log) << type;
+            EXPECT_EQ(platform.Calls("ORVASchedTaskFree"), failure.frees)
+                << type << ", " << failure.function;
+            EXPECT_EQ(platform.Leftovers(), "") << type << ", " << failure.function;
+            EXPECT_THAT(platform.tasks, IsEmpty());
+        }
+    }
+};
+
+TEST_F(FailedCreateTest, IsLoggedAndAnsweredForKindsThatLayAFormOverTheirDefaults) {
+    const std::string refused =
+        "ORVA.Core.TaskScheduler.Basic.cpp:222 Convert task from json (app) failed. "
+        "[0x0900 platform.cpp:42]";
+    for (const std::string type : {"recycle", "service"}) {
+        ExpectFailures(
+            type,
+            {{"ORVASchedTaskAlloc",
+              1,
+              R"(error 117 {"msg":"Failed to allocate task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:102 alloc task failed. id:[-1] "
+               "[0x0900 platform.cpp:42]",
+               refused},
+              0},
+             {"ORVASchedTaskLoad",
+              1,
+              R"(error 4801 {"msg":"Failed to load task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:108 load task failed. id:[-1] "
+               "[0x0900 platform.cpp:42]",
+               refused},
+              1},
+             {"ORVASchedTaskAlloc",
+              2,
+              R"(error 117 {"msg":"Failed to new task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:229 Failed to new task. "
+               "[0x0900 platform.cpp:42]"},
+              1},
+             {"ORVASchedTaskConvertFromJson_Basic",
+              1,
+              R"(error 117 {"msg":"Invalid (basic) object"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:234 Convert task from json (basic) failed. "
+               "[0x0900 platform.cpp:42]"},
+              2},
+             {"ORVASchedTaskConvertFromJson_Schedule",
+              1,
+              R"(error 117 {"msg":"Invalid (schedule) object"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:239 Convert task from json (schedule) failed. "
+               "[0x0900 platform.cpp:42]"},
+              2},
+             {"ORVASchedTaskSave",
+              1,
+              R"(error 117 {"msg":"Failed to save task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:251 Save task failed. "
+               "[0x0900 platform.cpp:42]"},
+              2}});
+    }
+}
+
+TEST_F(FailedCreateTest, IsLoggedAndAnsweredForKindsThatTakeTheirFormAsItIs) {
+    for (const std::string type : {"beep", "script"}) {
+        ExpectFailures(
+            type,
+            {{"ORVASchedTaskAlloc",
+              1,
+              R"(error 117 {"msg":"Failed to new task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:229 Failed to new task. "
+               "[0x0900 platform.cpp:42]"},
+              0},
+             {"ORVASchedTaskConvertFromJson_Basic",
+              1,
+              R"(error 117 {"msg":"Invalid (basic) object"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:234 Convert task from json (basic) failed. "
+               "[0x0900 platform.cpp:42]"},
+              1},
+             {"ORVASchedTaskConvertFromJson_Schedule",
+              1,
+              R"(error 117 {"msg":"Invalid (schedule) object"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:239 Convert task from json (schedule) failed. "
+               "[0x0900 platform.cpp:42]"},
+              1},
+             {"ORVASchedTaskSave",
+              1,
+              R"(error 117 {"msg":"Failed to save task"})",
+              {"ORVA.Core.TaskScheduler.Basic.cpp:251 Save task failed. "
+               "[0x0900 platform.cpp:42]"},
+              1}});
+        EXPECT_EQ(platform.Calls("ORVASchedTaskLoad"), 0) << type;
+    }
 }
 
 }  // namespace

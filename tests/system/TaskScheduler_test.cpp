@@ -164,14 +164,22 @@ TEST_F(TaskSchedulerTest, KeepsItsTasksFromStartToStart) {
 
 TEST_F(TaskSchedulerTest, ListsWithMissingAndDamagedTexts) {
     CreateScript("kept");
-    for (const char* content : {"", "{", "[]", "{\"service\":7}", "\xFF\xFE"}) {
-        server.Root().Write("usr/orva/orvaman/webman/texts/de/strings.json", content);
+    const auto action = [this] {
         const HttpAnswer answer = server.Post(std::string(kApi) + "list?lang=de", "{}");
         EXPECT_EQ(answer.status, 200) << answer.body;
-        EXPECT_EQ(ErrorCode(answer), 0) << content;
+        return AnswerDocument(answer)["data"]["tasks"][0]["action"].asString();
+    };
+    for (const char* content : {"", "{", "[]", "\xFF\xFE"}) {
+        server.Root().Write("usr/orva/orvaman/webman/texts/de/strings.json", content);
+        EXPECT_EQ(action(), "#common:run#: true") << content;
+    }
+    for (const char* content : {R"({"common":{"run":"Los"},"service":7})",
+                                R"({"common":{"a":[],"run":"Los","stop":null},"tree":{"b":{}}})"}) {
+        server.Root().Write("usr/orva/orvaman/webman/texts/de/strings.json", content);
+        EXPECT_EQ(action(), "Los: true") << content;
     }
     std::filesystem::remove_all(server.Root().Path() / "usr/orva/orvaman");
-    EXPECT_EQ(ErrorCode(server.Post(std::string(kApi) + "list?lang=de", "{}")), 0);
+    EXPECT_EQ(action(), "#common:run#: true");
 }
 
 TEST_F(TaskSchedulerTest, ServesManyCallersAtOnce) {

@@ -66,6 +66,17 @@ TEST_F(OrvaschedtoolTest, ABadDocumentChangesNothingAndIsExplained) {
     EXPECT_EQ(Run({"--import", "-"}, "[").status, 1);
 }
 
+TEST_F(OrvaschedtoolTest, AnIdThatWouldUseUpTheIdsIsRefused) {
+    const ProcessResult bad =
+        Run({"--import", "-"},
+            R"([{"basic":{"id":2147483647,"task_name":"a","app":"x","owner":"root"}}])");
+    EXPECT_EQ(bad.status, 1);
+    EXPECT_EQ(bad.err,
+              "orvaschedtool: -: task 1: basic.id: is higher than 1000000000; "
+              "nothing was imported\n");
+    EXPECT_THAT(Run({"--help"}).out, HasSubstr("1000000000"));
+}
+
 TEST_F(OrvaschedtoolTest, AFileThatCannotBeReadOrWrittenIsNamed) {
     const ProcessResult import = Run({"--import", "/no/such/file"});
     EXPECT_EQ(import.status, 1);

@@ -56,6 +56,39 @@ TEST_F(MachineZoneTest, APlainCopyOfAZoneFileIsRead) {
     EXPECT_EQ(zone.Now().At(absl::UnixEpoch()).offset, 19800);
 }
 
+TEST_F(MachineZoneTest, AZoneFileThatIsReplacedIsReadAgain) {
+    orva::MachineZone zone(Link());
+    const auto offset = [&zone] { return zone.Now().At(absl::UnixEpoch()).offset; };
+    const auto copy = [this](const std::string& name) {
+        std::filesystem::copy_file("/usr/share/zoneinfo/" + name, Link(),
+                                   std::filesystem::copy_options::overwrite_existing);
+    };
+    copy("Asia/Kolkata");
+    EXPECT_EQ(offset(), 19800);
+    copy("Asia/Tokyo");
+    EXPECT_EQ(offset(), 32400);
+    EXPECT_EQ(zone.Now(), zone.Now());
+    copy("Asia/Kolkata");
+    EXPECT_EQ(offset(), 19800);
+    Write("/localtime", "no zone");
+    EXPECT_EQ(offset(), 0);
+    EXPECT_THAT(TakeLog(), ElementsAre("no data for time zone \"" + Link() + "\"; using UTC"));
+    std::filesystem::remove(Link());
+    EXPECT_EQ(zone.Now().name(), "UTC");
+    EXPECT_THAT(TakeLog(), IsEmpty());
+}
+
+TEST_F(MachineZoneTest, AZoneFileThatTheEnvironmentNamesIsReadAgainToo) {
+    const std::string file = RootPath() + "/zone";
+    ::setenv("TZ", (":" + file).c_str(), 1);
+    orva::MachineZone zone(Link());
+    std::filesystem::copy_file("/usr/share/zoneinfo/Asia/Kolkata", file);
+    EXPECT_EQ(zone.Now().At(absl::UnixEpoch()).offset, 19800);
+    std::filesystem::remove(file);
+    std::filesystem::copy_file("/usr/share/zoneinfo/Asia/Tokyo", file);
+    EXPECT_EQ(zone.Now().At(absl::UnixEpoch()).offset, 32400);
+}
+
 TEST_F(MachineZoneTest, AnUnknownNameIsUtcAndLoggedOnce) {
     orva::MachineZone zone(Link());
     ::setenv("TZ", "Atlantis/Capital", 1);

@@ -198,6 +198,31 @@ TEST_F(SchedTaskListsTest, AnElementCanBeSavedAndIsNotFreedAlone) {
     EXPECT_EQ(ORVASchedTaskGetID(*head), 2);
 }
 
+TEST_F(SchedTaskListsTest, SavingAnElementChangesOnlyWhatWasWrittenToIt) {
+    FillStore();
+    // The filter disables task 5 in the list, not in the store.
+    ASSERT_EQ(ORVASchedTaskListGet(&head, Disables), 5);
+    ASSERT_THAT(Sorted("id", 0), ElementsAre(5, 4, 3, 2, 1));
+    ListRecord* const fifth = head;
+    ListRecord* const fourth = ORVASchedTaskNext(fifth);
+    const Record other;
+    for (const int id : {4, 5}) {
+        ASSERT_EQ(ORVASchedTaskLoad(id, other.Get()), 0);
+        ORVASchedCTaskSetCommand(other.Get(), "command of the other");
+        ASSERT_EQ(ORVASchedTaskSave(other.Get()), 0);
+    }
+    ORVASchedCTaskSetAction(fourth, "changed");
+    ASSERT_EQ(ORVASchedTaskSave(fourth), 0);
+    ASSERT_EQ(ORVASchedTaskSave(fifth), 0);
+    const orva::SharedTask storedFourth = orva::TaskStore::Current()->Find(4);
+    EXPECT_EQ(storedFourth->action, "changed");
+    EXPECT_EQ(storedFourth->command, "command of the other");
+    const orva::SharedTask storedFifth = orva::TaskStore::Current()->Find(5);
+    EXPECT_FALSE(storedFifth->Has(orva::kEnabled));
+    EXPECT_EQ(storedFifth->command, "command of the other");
+    EXPECT_THAT(Sorted("id", 1), ElementsAre(1, 2, 3, 4, 5));
+}
+
 TEST_F(SchedTaskListsTest, AListOutlivesTheChangesOfItsTasks) {
     FillStore();
     ASSERT_EQ(ORVASchedTaskListGet(&head, nullptr), 5);

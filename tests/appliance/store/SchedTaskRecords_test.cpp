@@ -2,8 +2,13 @@
 
 #include <fcntl.h>
 #include <sys/file.h>
+#include <unistd.h>
+
+#include <memory>
+#include <string>
 
 #include "appliance/store/Accounts.h"
+#include "appliance/store/TaskRecord.h"
 #include "appliance/util/Error.h"
 #include "appliance/util/FileDescriptor.h"
 #include "platform/qlibc.h"
@@ -13,6 +18,7 @@
 namespace {
 
 using SchedTaskRecordsTest = StoreTest;
+using testing::ElementsAre;
 
 int SaveSample(const std::string& name) {
     const Record task;
@@ -114,8 +120,23 @@ TEST_F(SchedTaskRecordsTest, ATaskWithoutANameOrAnAppCannotBeSaved) {
     const int id = SaveSample("a");
     ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
     ORVASchedCTaskSetApp(task.Get(), "");
+    TakeLog();
     EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_THAT(TakeLog(), ElementsAre("task refused: basic.app: is missing"));
     EXPECT_EQ(orva::TaskStore::Current()->CurrentSnapshot()->Count(), 1U);
+}
+
+TEST_F(SchedTaskRecordsTest, ATaskThatNobodyOwnsCannotBeSavedAndTheLogSaysWhy) {
+    auto ownerless = std::make_shared<orva::TaskData>(SampleTask("a"));
+    ownerless->owner.clear();
+    const Record task;
+    task.Get()->Show(ownerless);
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
+    EXPECT_THAT(TakeLog(),
+                ElementsAre("task refused: basic.owner: is missing, and user id " +
+                            std::to_string(::geteuid()) + " has no account to own the task"));
+    EXPECT_EQ(orva::TaskStore::Current()->CurrentSnapshot()->Count(), 0U);
 }
 
 TEST_F(SchedTaskRecordsTest, LoadingMinusOneGivesANewRecord) {
@@ -153,16 +174,20 @@ TEST_F(SchedTaskRecordsTest, ARemovedTaskIsGone) {
 
 TEST_F(SchedTaskRecordsTest, RunSaysWhyItCannot) {
     const int id = SaveSample("a");
+    TakeLog();
     EXPECT_LT(ORVASchedTaskRun(id, 0, 0), 0);
     EXPECT_EQ(QLIBCErrGet(), orva::kErrNotAllowed);
+    EXPECT_THAT(TakeLog(), ElementsAre("task 1 was not started: it has no command"));
     const Record task;
     ORVASchedTaskLoad(id, task.Get());
     ORVASchedCTaskSetCommand(task.Get(), "true");
     ASSERT_EQ(ORVASchedTaskSave(task.Get()), 0);
     EXPECT_LT(ORVASchedTaskRun(id, 0, 0), 0);
     EXPECT_EQ(QLIBCErrGet(), orva::kErrNoScheduler);
+    EXPECT_THAT(TakeLog(), ElementsAre("task 1 was not started: no scheduler is running"));
     EXPECT_LT(ORVASchedTaskRun(99, 0, 0), 0);
     EXPECT_EQ(QLIBCErrGet(), orva::kErrNotFound);
+    EXPECT_THAT(TakeLog(), ElementsAre("task 99 was not started: there is no such task"));
     EXPECT_LT(ORVASchedTaskRun(id, 1, 0), 0);
     EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
 
@@ -171,6 +196,7 @@ TEST_F(SchedTaskRecordsTest, RunSaysWhyItCannot) {
         ::open((RootPath() + "/run/orva/schedd.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
     ASSERT_EQ(::flock(lock.Get(), LOCK_EX), 0);
     EXPECT_EQ(ORVASchedTaskRun(id, 0, 0), 0);
+    EXPECT_THAT(TakeLog(), testing::IsEmpty());
 }
 
 TEST_F(SchedTaskRecordsTest, WritersRefuseNullAndFlagsThatAreNeitherZeroNorOne) {
@@ -196,6 +222,70 @@ TEST_F(SchedTaskRecordsTest, ARecordDoesNotChangeWhenItsTaskDoes) {
     ORVASchedCTaskSetApp(first.Get(), "changed");
     ASSERT_EQ(ORVASchedTaskSave(first.Get()), 0);
     EXPECT_EQ(ORVASchedTaskGetApp(*second), "ORVA.ZUM.TaskScheduler.Script");
+}
+
+TEST_F(SchedTaskRecordsTest, ASaveKeepsWhatOthersSavedSinceTheRecordWasLoaded) {
+    const int id = SaveSample("a");
+    const Record first;
+    const Record second;
+    ASSERT_EQ(ORVASchedTaskLoad(id, first.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskLoad(id, second.Get()), 0);
+    ORVASchedCTaskSetApp(first.Get(), "app of the first");
+    ORVASchedCTaskSetAppArgs(first.Get(), "args of the first");
+    ORVASchedCTaskSetCanEditName(first.Get(), 0);
+    ORVASchedCTaskSetState(second.Get(), false);
+    ORVASchedCTaskSetAppArgs(second.Get(), "args of the second");
+    ASSERT_EQ(ORVASchedTaskSave(first.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskSave(second.Get()), 0);
+
+    orva::TaskData expected;
+    expected.id = id;
+    expected.name = "a";
+    expected.owner = orva::OwnAccount();
+    expected.app = "app of the first";
+    expected.appArgs = "args of the second";
+    expected.Set(orva::kCanEditName, false);
+    expected.Set(orva::kEnabled, false);
+    EXPECT_EQ(*orva::TaskStore::Current()->Find(id), expected);
+    // The record shows the task as it is stored, and a further save starts from there.
+    EXPECT_EQ(second.Get()->Data(), expected);
+    EXPECT_EQ(ORVASchedTaskGetNextTriggerTime(*second), "N/A");
+    ORVASchedCTaskSetApp(first.Get(), "changed again");
+    ASSERT_EQ(ORVASchedTaskSave(first.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskSave(second.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetApp(*second), "changed again");
+}
+
+TEST_F(SchedTaskRecordsTest, AFlagThatIsSetBackBeforeTheSaveIsNoChange) {
+    const int id = SaveSample("a");
+    const Record first;
+    const Record second;
+    ASSERT_EQ(ORVASchedTaskLoad(id, first.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskLoad(id, second.Get()), 0);
+    ORVASchedCTaskSetState(first.Get(), false);
+    ASSERT_EQ(ORVASchedTaskSave(first.Get()), 0);
+    ORVASchedCTaskSetState(second.Get(), false);
+    ORVASchedCTaskSetState(second.Get(), true);
+    ASSERT_EQ(ORVASchedTaskSave(second.Get()), 0);
+    EXPECT_FALSE(ORVASchedTaskIsEnabled(*second));
+}
+
+TEST_F(SchedTaskRecordsTest, ANewTaskThatWasSavedKeepsWhatOthersChangeInIt) {
+    const Record created;
+    Json::Value doc;
+    doc["basic"]["id"] = "-1";
+    doc["basic"]["task_name"] = "a";
+    ASSERT_TRUE(ORVASchedTaskConvertFromJson_Basic(doc, *created));
+    ORVASchedCTaskSetApp(created.Get(), "app");
+    ASSERT_EQ(ORVASchedTaskSave(created.Get()), 0);
+    const Record other;
+    ASSERT_EQ(ORVASchedTaskLoad(1, other.Get()), 0);
+    ORVASchedCTaskSetAction(other.Get(), "action of the other");
+    ASSERT_EQ(ORVASchedTaskSave(other.Get()), 0);
+    ORVASchedCTaskSetCommand(created.Get(), "true");
+    ASSERT_EQ(ORVASchedTaskSave(created.Get()), 0);
+    EXPECT_EQ(ORVASchedTaskGetAction(*created), "action of the other");
+    EXPECT_EQ(orva::TaskStore::Current()->Find(1)->command, "true");
 }
 
 }  // namespace

@@ -229,6 +229,87 @@ TEST_F(SchedTaskSectionsTest, AChangedNameOrOwnerIsRefusedWhereTheStoredTaskForb
     EXPECT_EQ(ORVASchedTaskGetName(*record), "b");
 }
 
+TEST_F(SchedTaskSectionsTest, AnOwnerWhoseAccountIsGonePassesAsLongAsItIsNotChanged) {
+    TaskData stored = SampleTask("a");
+    stored.owner = "gone";
+    stored.Set(orva::kCanEditOwner, true);
+    stored.id = TaskStore::Current()->Save(stored);
+    const Record record;
+    ASSERT_TRUE(ORVASchedTaskConvertFromJson_Basic(
+        Parse(R"({"basic":{"id":"1","task_name":"b","owner":"gone"}})"), *record));
+    ASSERT_EQ(ORVASchedTaskSave(record.Get()), 0);
+    stored.name = "b";
+    EXPECT_EQ(*TaskStore::Current()->Find(1), stored);
+    EXPECT_EQ(BasicProblem(R"({"basic":{"id":"1","owner":"gone too"}})"),
+              "task refused: basic.owner: no account named \"gone too\"");
+    EXPECT_EQ(BasicProblem(NewTask(R"("task_name":"c","owner":"gone")")),
+              "task refused: basic.owner: no account named \"gone\"");
+}
+
+TEST_F(SchedTaskSectionsTest, ASetKeepsWhatOthersSavedSinceItTookOverTheTask) {
+    TaskData stored = SampleTask("a");
+    stored.id = TaskStore::Current()->Save(stored);
+    const Record record;
+    ASSERT_TRUE(ORVASchedTaskConvertFromJson_Basic(
+        Parse(R"({"basic":{"id":"1","task_name":"b","owner":"root","enabled":"on"}})"), *record));
+    ASSERT_TRUE(
+        ORVASchedTaskConvertFromJson_Schedule(Parse(R"({"schedule":{"hour":7}})"), *record));
+    const Record other;
+    ASSERT_EQ(ORVASchedTaskLoad(1, other.Get()), 0);
+    ORVASchedCTaskSetState(other.Get(), false);
+    ORVASchedCTaskSetCommand(other.Get(), "false");
+    ASSERT_TRUE(
+        ORVASchedTaskConvertFromJson_Schedule(Parse(R"({"schedule":{"interval_min":5}})"), *other));
+    ASSERT_EQ(ORVASchedTaskSave(other.Get()), 0);
+    ASSERT_EQ(ORVASchedTaskSave(record.Get()), 0);
+    stored.name = "b";
+    stored.command = "false";
+    stored.Set(orva::kEnabled, false);
+    // The schedule is one property: its parts only make sense together.
+    stored.schedule.firstMinute = 7 * 60 + 30;
+    EXPECT_EQ(*TaskStore::Current()->Find(1), stored);
+    EXPECT_EQ(ORVASchedTaskGetNextTriggerTime(*record), "N/A");
+}
+
+TEST_F(SchedTaskSectionsTest, ASetOfAnotherApplicationsTaskChangesNameOwnerStateAndScheduleOnly) {
+    for (const char* app :
+         {"ORVA.Example.PhotoIndex", "ORVA.ZUM.DataAnalysis", "ORVA.ZUM.BackupApp.NetBackup",
+          "ORVA.ZUM.BackupApp.LocalBackup", "ORVA.ZUM.BackupApp.LUNBackup",
+          "ORVA.ZUM.BackupApp.S3Backup", "ORVA.ZUM.TaskScheduler.AutoPower",
+          "ORVA.ZUM.TaskScheduler.KELAutoUpdate"}) {
+        TaskData task = SampleTask("before");
+        task.app = app;
+        task.appName = "#app:title# of " + task.app;
+        task.appArgs = "{ \"b\":1,\"a\" : [2.50,null]}\n\n";
+        task.action = "#app:does# \t\xc3\xa4";
+        task.command = "run 'it'\nand wait";
+        task.editForm = "Form";
+        task.flags = orva::kEnabled | orva::kSimpleEditForm | orva::kCanEditName |
+                     orva::kCanEditOwner | orva::kCanRunTaskSameTime | orva::kCanDeleteFromUI;
+        task.schedule.date = absl::CivilDay(2028, 2, 29);
+        task.schedule.runMissed = true;
+        task.id = TaskStore::Current()->Save(task);
+
+        Json::Value doc =
+            Parse(R"({"basic":{"task_name":"after","owner":"daemon","enabled":"off",)"
+                  R"("app":"x","action":"x","command":"x","app_args":"x","edit_form":"x",)"
+                  R"("listable":true,"can_edit_name":false,"can_run_task_same_time":false},)"
+                  R"("schedule":{"hour":22,"min":5,"week_name":"1,5"},)"
+                  R"("app":{"a":"x"},"command":"x","listable":true})");
+        doc["basic"]["id"] = std::to_string(task.id);
+        const Record record;
+        ASSERT_TRUE(ORVASchedTaskConvertFromJson_Basic(doc, *record)) << app;
+        ASSERT_TRUE(ORVASchedTaskConvertFromJson_Schedule(doc, *record)) << app;
+        ASSERT_EQ(ORVASchedTaskSave(record.Get()), 0) << app;
+        task.name = "after";
+        task.owner = "daemon";
+        task.Set(orva::kEnabled, false);
+        task.schedule.firstMinute = 22 * 60 + 5;
+        task.schedule.weekDays = 0b100010;
+        EXPECT_EQ(*TaskStore::Current()->Find(task.id), task) << app;
+    }
+}
+
 TEST_F(SchedTaskSectionsTest, ARefusedScheduleLeavesTheRecordUnchanged) {
     const Record record;
     TakeLog();

@@ -125,6 +125,38 @@ TEST_F(StoreThreadsTest, NoTwoTasksGetTheSameId) {
     EXPECT_EQ(TaskStore::Current()->CurrentSnapshot()->Count(), kThreads * kEach);
 }
 
+TEST_F(StoreThreadsTest, ChangesOfDifferentPropertiesOfOneTaskAreAllKept) {
+    constexpr int kChanges = 40;
+    TaskStore::Current()->Save(SampleTask("a"));
+    const std::vector<int (*)(_tag_orva_sched_task_*, const char*)> writers = {
+        ORVASchedCTaskSetAppArgs, ORVASchedCTaskSetAction, ORVASchedCTaskSetCommand,
+        ORVASchedCTaskSetEditForm};
+    const std::vector<std::string orva::TaskData::*> properties = {
+        &orva::TaskData::appArgs, &orva::TaskData::action, &orva::TaskData::command,
+        &orva::TaskData::editForm};
+    std::atomic<int> failures = 0;
+    std::vector<std::thread> threads;
+    threads.reserve(writers.size());
+    for (std::size_t number = 0; number < writers.size(); ++number) {
+        threads.emplace_back([&, number] {
+            for (int count = 1; count <= kChanges; ++count) {
+                const std::string text = std::to_string(count);
+                const Record task;
+                if (ORVASchedTaskLoad(1, task.Get()) != 0 ||
+                    writers[number](task.Get(), text.c_str()) != 0 ||
+                    ORVASchedTaskSave(task.Get()) != 0 ||
+                    (*TaskStore::Current()->Find(1)).*properties[number] != text) {
+                    ++failures;
+                }
+            }
+        });
+    }
+    for (std::thread& thread : threads) {
+        thread.join();
+    }
+    EXPECT_EQ(failures, 0);
+}
+
 TEST_F(StoreThreadsTest, TheStoreIsCreatedOnceWhenAllWantItAtOnce) {
     std::atomic<int> failures = 0;
     std::vector<std::unique_ptr<TaskStore>> stores;

@@ -108,6 +108,32 @@ TEST_F(TaskStoreTest, ATaskThatIsGoneCanBeNeitherSavedNorRemovedNorFound) {
     EXPECT_THAT(Ids(*store.CurrentSnapshot()), IsEmpty());
 }
 
+TEST_F(TaskStoreTest, AChangeLeavesEverythingElseAsOthersHaveStoredIt) {
+    TaskStore& store = *TaskStore::Current();
+    const auto other = OtherProcess();
+    TaskData base = SampleTask("a");
+    base.id = store.Save(base);
+    TaskData theirs = base;
+    theirs.name = "b";
+    theirs.schedule.firstMinute = 60;
+    theirs.Set(orva::kListable, false);
+    other->Save(theirs);
+    TaskData ours = base;
+    ours.command = "false";
+    ours.Set(orva::kCanEditOwner, true);
+    const orva::SharedTask stored = store.Change(base, ours);
+    TaskData expected = theirs;
+    expected.command = "false";
+    expected.Set(orva::kCanEditOwner, true);
+    EXPECT_EQ(*stored, expected);
+    EXPECT_EQ(*other->Find(base.id), expected);
+    // The start belongs to the schedule that is stored, not to the one that was read.
+    EXPECT_EQ(Stored("SELECT datetime(next_start, 'unixepoch') FROM task"), "2026-05-02 01:00:00");
+    other->Remove(base.id);
+    EXPECT_EQ(CodeOf([&] { store.Change(base, ours); }), orva::kErrNotFound);
+    EXPECT_EQ(store.Find(base.id), nullptr);
+}
+
 TEST_F(TaskStoreTest, TheNextStartIsStoredWhereTheSchedulerFindsIt) {
     TaskStore& store = *TaskStore::Current();
     TaskData task = SampleTask("a");

@@ -189,6 +189,22 @@ TEST_F(TaskTransferTest, AnIdThatComesTwiceIsRefused) {
               "task 2: basic.id: task 1 has it already");
 }
 
+TEST_F(TaskTransferTest, AnIdThatWouldUseUpTheIdsIsRefused) {
+    EXPECT_EQ(Problem(R"([{"basic":{"id":2147483647,"task_name":"a","app":"x"}}])"),
+              "task 1: basic.id: is higher than 1000000000");
+    EXPECT_EQ(Problem(R"([{"basic":{"id":"1000000001","task_name":"a","app":"x"}}])"),
+              "task 1: basic.id: is higher than 1000000000");
+    EXPECT_EQ(orva::ImportTasks(*TaskStore::Current(),
+                                R"([{"basic":{"id":1000000000,"task_name":"a","app":"x"}}])")
+                  .problem,
+              "");
+    // One that is stored already uses up nothing.
+    EXPECT_EQ(TaskStore::Current()->Save(SampleTask("b")), 1000000001);
+    const std::string exported = orva::ExportTasks(*TaskStore::Current());
+    EXPECT_EQ(orva::ImportTasks(*TaskStore::Current(), exported).problem, "");
+    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()), exported);
+}
+
 TEST_F(TaskTransferTest, TheOverviewIsATable) {
     TaskStore::Current()->Save(SampleTask("Backup"));
     TaskData off = SampleTask("Off");

@@ -36,15 +36,46 @@ TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectWithoutADirectoryOrAFile) {
 }
 
 TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectForADamagedFileAndLogsItOnce) {
-    Write(kFile, R"({"common": ["run"]})");
+    Write(kFile, R"(["run"])");
     for (int i = 0; i < 5; ++i) {
         EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
     }
-    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": section \"common\" is no object"));
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": the document is no object"));
     Write(kFile, "{");
     EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
                                        ": Line 1, Column 2 Missing '}' or object member name"));
+}
+
+TEST_F(LocalizedStringParserTest, ServesTheRestOfAFileWithAFaultAndLogsItOnceAVersion) {
+    Write(kFile, R"({"common": {"run": "Run", "stop": 7}, "service": "x"})");
+    Json::Value rest;
+    rest["common"]["run"] = "Run";
+    for (int i = 0; i < 5; ++i) {
+        EXPECT_EQ(parser.ParseTexts(kDirectory), rest);
+    }
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
+                                       ": section \"service\" is no object (faults in all: 2)"));
+    Write(kFile, R"({"common": {"run": "Run", "stop": 7}})");
+    EXPECT_EQ(parser.ParseTexts(kDirectory), rest);
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": \"common:stop\" is no text"));
+}
+
+TEST_F(LocalizedStringParserTest, RemembersTheTextsOfAsManyApplicationsAsThereCanBe) {
+    const auto directory = [](int app) {
+        return "/usr/orva/orvaman/webman/apps/app" + std::to_string(app) + "/texts/en";
+    };
+    constexpr int kApps = 600;
+    for (int app = 0; app < kApps; ++app) {
+        Write(directory(app) + "/strings.json", R"({"common": 7})");
+    }
+    for (int round = 0; round < 2; ++round) {
+        for (int app = 0; app < kApps; ++app) {
+            EXPECT_EQ(parser.ParseTexts(directory(app)), empty);
+        }
+        // A file is logged when it is parsed.
+        EXPECT_EQ(TakeLog().size(), round == 0 ? std::size_t{kApps} : 0U);
+    }
 }
 
 TEST_F(LocalizedStringParserTest, SeesAChangedFileAtOnce) {

@@ -16,6 +16,43 @@ TEST(TextFileTest, ReadsSectionsOfTexts) {
     EXPECT_EQ(error, "");
 }
 
+TEST(TextFileTest, LeavesOutOnlyWhatIsNoTextAndNamesTheFirst) {
+    const auto parse = [](const char* content, std::string& error) {
+        error.clear();
+        return orva::ParseTextFile(content, error);
+    };
+    std::string error;
+    Json::Value rest;
+    rest["common"]["run"] = "Run";
+    EXPECT_EQ(parse(R"({"common": {"run": "Run"}, "service": "x"})", error), rest);
+    EXPECT_EQ(error, "section \"service\" is no object");
+    EXPECT_EQ(parse(R"({"common": {"a": 7, "run": "Run"}})", error), rest);
+    EXPECT_EQ(error, "\"common:a\" is no text");
+    EXPECT_EQ(parse(R"({"common": {"run": "Run", "z": {"a": "b"}}})", error), rest);
+    EXPECT_EQ(error, "\"common:z\" is no text");
+    EXPECT_EQ(parse(R"({"common": {"run": "Run", "y": null, "z": []}})", error), rest);
+    EXPECT_EQ(error, "\"common:y\" is no text (faults in all: 2)");
+    EXPECT_EQ(parse(R"({"a": [], "b": 1, "common": {"run": "Run", "x": 0}})", error), rest);
+    EXPECT_EQ(error, "section \"a\" is no object (faults in all: 3)");
+}
+
+TEST(TextFileTest, KeepsASectionWhoseTextsAreAllWrong) {
+    std::string error;
+    Json::Value rest;
+    rest["common"] = Json::Value(Json::objectValue);
+    EXPECT_EQ(orva::ParseTextFile(R"({"common": {"run": 7}})", error), rest);
+    EXPECT_EQ(error, "\"common:run\" is no text");
+}
+
+TEST(TextFileTest, NamesWhatIsWrongOnOneLineWhateverTheNameHolds) {
+    std::string error;
+    EXPECT_EQ(orva::ParseTextFile(R"({"a\nb\"": 1})", error), kEmpty);
+    EXPECT_EQ(error, R"(section "a\nb\"" is no object)");
+    error.clear();
+    EXPECT_EQ(orva::ParseTextFile(R"({"a\n": {"b\n": 1}})", error)["a\n"], kEmpty);
+    EXPECT_EQ(error, R"("a\n:b\n" is no text)");
+}
+
 TEST(TextFileTest, GivesAnEmptyObjectForAnythingElseAndSaysWhy) {
     const auto errorOf = [](const char* content) {
         std::string error;
@@ -24,9 +61,6 @@ TEST(TextFileTest, GivesAnEmptyObjectForAnythingElseAndSaysWhy) {
     };
     EXPECT_EQ(errorOf("[]"), "the document is no object");
     EXPECT_EQ(errorOf("null"), "the document is no object");
-    EXPECT_EQ(errorOf(R"({"common": "run"})"), "section \"common\" is no object");
-    EXPECT_EQ(errorOf(R"({"common": {"run": 7}})"), "\"common:run\" is no text");
-    EXPECT_EQ(errorOf(R"({"common": {"run": {"a": "b"}}})"), "\"common:run\" is no text");
     EXPECT_EQ(errorOf("{} x"), "line 1, column 4: an unexpected character");
     EXPECT_NE(errorOf(""), "");
 }

@@ -34,7 +34,8 @@ class FileCacheTest : public Sandbox {
             }
             return text;
         };
-    orva::FileCache<std::string> cache{3, 100, false, upperCase};
+    orva::FileCache<std::string> cache{
+        {.files = 3, .totalBytes = 250, .fileBytes = 100}, false, upperCase};
 };
 
 TEST_F(FileCacheTest, GivesWhatTheParserMadeOfTheFile) {
@@ -123,7 +124,8 @@ TEST_F(FileCacheTest, GivesNothingForAMissingFileAndSeesItComeAndGo) {
 }
 
 TEST_F(FileCacheTest, LogsAMissingFileOnceWhereThatIsAsked) {
-    orva::FileCache<std::string> logging(3, 100, true, upperCase);
+    orva::FileCache<std::string> logging({.files = 3, .totalBytes = 250, .fileBytes = 100}, true,
+                                         upperCase);
     EXPECT_EQ(logging.Get(Path("a")), nullptr);
     EXPECT_EQ(logging.Get(Path("a")), nullptr);
     EXPECT_THAT(TakeLog(), ElementsAre(Path("a") + ": No such file or directory"));
@@ -167,6 +169,45 @@ TEST_F(FileCacheTest, ForgetsTheFileAskedForLeastRecently) {
     EXPECT_EQ(parsed, 4);
     EXPECT_NE(cache.Get(Path("b")), b);
     EXPECT_EQ(parsed, 5);
+}
+
+TEST_F(FileCacheTest, ForgetsTheFileAskedForLeastRecentlyWhenAllAreTooLarge) {
+    Write("/a", std::string(90, 'a'));
+    Write("/b", std::string(90, 'b'));
+    Write("/c", std::string(70, 'c'));
+    const auto a = cache.Get(Path("a"));
+    cache.Get(Path("b"));
+    const auto c = cache.Get(Path("c"));
+    EXPECT_EQ(cache.Size(), 3U);
+    EXPECT_EQ(cache.Get(Path("a")), a);
+    Write("/c", std::string(71, 'c'));
+    EXPECT_NE(cache.Get(Path("c")), c);
+    EXPECT_EQ(cache.Size(), 2U);
+    EXPECT_EQ(cache.Get(Path("a")), a);
+    EXPECT_EQ(parsed, 4);
+    cache.Get(Path("b"));
+    EXPECT_EQ(parsed, 5);
+    EXPECT_EQ(cache.Size(), 2U);
+}
+
+TEST_F(FileCacheTest, CountsNoBytesForFilesThatAreGoneOrForgotten) {
+    for (int i = 0; i < 20; ++i) {
+        const std::string name = std::to_string(i);
+        Write("/" + name, std::string(100, 'x'));
+        cache.Get(Path(name));
+        EXPECT_EQ(cache.Size(), i == 0 ? 1U : 2U) << i;
+    }
+    std::filesystem::remove(Path("18"));
+    std::filesystem::remove(Path("19"));
+    EXPECT_EQ(cache.Get(Path("18")), nullptr);
+    EXPECT_EQ(cache.Get(Path("19")), nullptr);
+    Write("/a", std::string(100, 'a'));
+    const auto a = cache.Get(Path("a"));
+    EXPECT_EQ(cache.Size(), 3U);
+    Write("/b", std::string(100, 'b'));
+    const auto b = cache.Get(Path("b"));
+    EXPECT_EQ(cache.Get(Path("a")), a);
+    EXPECT_EQ(cache.Get(Path("b")), b);
 }
 
 TEST_F(FileCacheTest, ParsesAFileOnceForManyThreads) {

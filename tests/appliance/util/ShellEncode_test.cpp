@@ -2,6 +2,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
@@ -197,7 +198,9 @@ TEST(ShellEncodeFormTest, TakesDoubleQuotesForALineEndAmongManyQuotes) {
 
 TEST(ShellEncodeFormTest, RefusesTheEmptyTextInItsBuffer) {
     QLIBCErrSetEx(0, "", 0);
+    errno = 0;
     EXPECT_EQ(Encode(""), std::nullopt);
+    EXPECT_EQ(errno, ERANGE);
     EXPECT_EQ(QLIBCErrGet(), 0x0E00);
     EXPECT_EQ(EncodeInto("", 3), "''");
 }
@@ -206,7 +209,9 @@ TEST(ShellEncodeFormTest, RefusesABufferThatIsTooSmall) {
     EXPECT_EQ(EncodeInto("abc", 6), "'abc'");
     EXPECT_EQ(EncodeInto("abc", 5), "abc");
     EXPECT_EQ(EncodeInto("abc", 4), "abc");
+    errno = 0;
     EXPECT_EQ(EncodeInto("abc", 3), std::nullopt);
+    EXPECT_EQ(errno, ERANGE);
     EXPECT_EQ(EncodeInto("\n", 3), std::nullopt);
     EXPECT_EQ(EncodeInto("a b", 1), std::nullopt);
     EXPECT_EQ(EncodeInto("a b", 0), std::nullopt);
@@ -214,12 +219,19 @@ TEST(ShellEncodeFormTest, RefusesABufferThatIsTooSmall) {
 
 TEST(ShellEncodeFormTest, RefusesBadArguments) {
     char buffer[4] = "old";
-    EXPECT_LT(QLIBCEncShParam("a", nullptr, 4), 0);
-    EXPECT_LT(QLIBCEncShParam("a", buffer, -1), 0);
+    const auto expectRefused = [](const char* text, char* target, int size) {
+        QLIBCErrSetEx(0, "", 0);
+        errno = 0;
+        EXPECT_LT(QLIBCEncShParam(text, target, size), 0);
+        EXPECT_EQ(errno, EINVAL);
+        EXPECT_EQ(QLIBCErrGet(), 0x0D00);
+    };
+    expectRefused("a", nullptr, 4);
+    expectRefused("a", buffer, -1);
+    expectRefused("a", buffer, 0);
     EXPECT_STREQ(buffer, "old");
-    EXPECT_LT(QLIBCEncShParam(nullptr, buffer, 4), 0);
+    expectRefused(nullptr, buffer, 4);
     EXPECT_STREQ(buffer, "");
-    EXPECT_EQ(QLIBCErrGet(), 0x0D00);
 }
 
 // Single quotes cost up to four bytes a byte, backslashes two but cannot hold a line end, double

@@ -8,7 +8,6 @@
 namespace {
 
 using orva::ParseStrictJson;
-using orva::ValidUtf8Length;
 using namespace std::string_literals;
 
 std::string ErrorOf(const std::string& text) {
@@ -208,15 +207,16 @@ TEST(StrictJsonTest, ChecksEveryStartOfADocumentWithoutHarm) {
     }
 }
 
-TEST(ValidUtf8LengthTest, EndsBeforeTheFirstBadByte) {
-    EXPECT_EQ(ValidUtf8Length(""), 0U);
-    EXPECT_EQ(ValidUtf8Length("abc"), 3U);
-    EXPECT_EQ(ValidUtf8Length("é€\U0001F600"), 9U);
-    EXPECT_EQ(ValidUtf8Length("a\x80"), 1U);
-    EXPECT_EQ(ValidUtf8Length("ab\xE2\x82"), 2U);
-    EXPECT_EQ(ValidUtf8Length("a\0b"s), 3U);
-    EXPECT_EQ(ValidUtf8Length("\xF4\x8F\xBF\xBF"), 4U);
-    EXPECT_EQ(ValidUtf8Length("\xEF\xBF\xBF"), 3U);
+TEST(StrictJsonTest, TakesOnlyAnObjectWhereOneIsAskedFor) {
+    std::string error = "untouched";
+    const auto object = orva::ParseStrictObject(R"({"a":1})", error);
+    ASSERT_TRUE(object.has_value());
+    EXPECT_EQ((*object)["a"], 1);
+    EXPECT_EQ(error, "untouched");
+    EXPECT_FALSE(orva::ParseStrictObject("[]", error).has_value());
+    EXPECT_EQ(error, "the document is no object");
+    EXPECT_FALSE(orva::ParseStrictObject("{} x", error).has_value());
+    EXPECT_EQ(error, "line 1, column 4: an unexpected character");
 }
 
 }  // namespace

@@ -95,13 +95,13 @@ TEST_F(DispatcherTest, AnswersForAMethodThatSaysNothing) {
     EXPECT_EQ(log, "test: Test 1 say_nothing failed: it answered nothing\n");
 }
 
-TEST_F(DispatcherTest, TakesAJsonExceptionForAParameterOfTheWrongType) {
+TEST_F(DispatcherTest, TakesAJsonExceptionForAParameterOfTheWrongTypeAndLogsIt) {
     const ApiAnswer answer = Call("throw_json", R"({"text":"five"})");
     EXPECT_EQ(answer.status, 400);
     EXPECT_EQ(
         WriteAnswer(answer.response),
         R"({"success":false,"error":{"code":105,"details":{"msg":"a parameter has the wrong type"}}})");
-    EXPECT_EQ(log, "");
+    EXPECT_EQ(log, "test: Test 1 throw_json failed: Value is not convertible to Int.\n");
 }
 
 TEST_F(DispatcherTest, RefusesABodyThatIsNoJsonObject) {
