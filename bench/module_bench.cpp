@@ -3,7 +3,6 @@
 // table at the end compares the two, each by its median.
 //
 // ORVA_BENCH_TASKS sets the number of stored tasks, 10000 by default.
-#include "bench/ModuleBench.h"
 
 #include <SQLiteCpp/Database.h>
 #include <SQLiteCpp/Statement.h>
@@ -18,6 +17,8 @@
 #include "appliance/webapi/ApiAnswer.h"
 #include "appliance/webapi/JsonWriter.h"
 #include "bench/FloorReporter.h"
+#include "bench/ModuleBench.h"
+#include "bench/RawTransaction.h"
 
 namespace orva {
 namespace {
@@ -119,16 +120,9 @@ void WholeListAndItsText_floor(benchmark::State& state) {
 }
 BENCHMARK(WholeListAndItsText_floor)->Unit(benchmark::kMillisecond);
 
-// A copy of the database under SQLite alone, with the store's durability.
 SQLite::Database& RawDatabase() {
-    static SQLite::Database raw = [] {
-        const std::string path = (Appliance().Root() / "raw.db").string();
-        SQLite::Database(Appliance().Database().string(), SQLite::OPEN_READONLY)
-            .exec("VACUUM INTO '" + path + "'");
-        SQLite::Database database(path, SQLite::OPEN_READWRITE);
-        database.exec("PRAGMA journal_mode=WAL; PRAGMA synchronous=FULL");
-        return database;
-    }();
+    static SQLite::Database raw =
+        CopyDatabase(Appliance().Database(), Appliance().Root() / "raw.db");
     return raw;
 }
 
@@ -146,23 +140,15 @@ void SetEnable(benchmark::State& state) {
 BENCHMARK(SetEnable)->Unit(benchmark::kMicrosecond)->UseRealTime();
 
 void SetEnable_floor(benchmark::State& state) {
-    SQLite::Database& raw = RawDatabase();
-    SQLite::Statement begin(raw, "BEGIN IMMEDIATE");
-    SQLite::Statement commit(raw, "COMMIT");
-    SQLite::Statement update(
-        raw,
-        "UPDATE task SET flags = ?, name = name || '', app_args = app_args || '',"
-        " next_start = coalesce(next_start, 0) + 60 WHERE id = ?");
+    RawTransaction transaction(
+        RawDatabase(), {"UPDATE task SET flags = flags + 1, name = name || '', owner = owner || '',"
+                        " app = app || '', app_name = app_name || '', app_args = app_args || '',"
+                        " action = action || '', command = command || '',"
+                        " edit_form = edit_form || '',"
+                        " next_start = coalesce(next_start, 0) + 60 WHERE id = ?"});
     int round = 0;
     for (auto _ : state) {
-        begin.exec();
-        begin.reset();
-        update.bind(1, ++round);
-        update.bind(2, round % TaskCount() + 1);
-        update.exec();
-        update.reset();
-        commit.exec();
-        commit.reset();
+        transaction.Run(++round % TaskCount() + 1);
     }
 }
 BENCHMARK(SetEnable_floor)->Unit(benchmark::kMicrosecond)->UseRealTime();
@@ -186,22 +172,15 @@ void Delete_floor(benchmark::State& state) {
                           " app_args, action, command, edit_form, mode, repeat, week_days,"
                           " date, first_minute, interval_minutes, last_minute, run_missed,"
                           " next_start FROM task WHERE id = 1");
-    SQLite::Statement begin(raw, "BEGIN IMMEDIATE");
-    SQLite::Statement commit(raw, "COMMIT");
-    SQLite::Statement remove(raw, "DELETE FROM task WHERE id = ?");
+    RawTransaction transaction(raw, {"DELETE FROM task WHERE id = ?",
+                                     "DELETE FROM run WHERE task = ? AND state = 'queued'"});
     for (auto _ : state) {
         state.PauseTiming();
         add.exec();
         add.reset();
-        const std::int64_t id = raw.getLastInsertRowid();
+        const auto id = static_cast<int>(raw.getLastInsertRowid());
         state.ResumeTiming();
-        begin.exec();
-        begin.reset();
-        remove.bind(1, id);
-        remove.exec();
-        remove.reset();
-        commit.exec();
-        commit.reset();
+        transaction.Run(id);
     }
 }
 BENCHMARK(Delete_floor)->Unit(benchmark::kMicrosecond)->UseRealTime();

@@ -16,6 +16,7 @@
 #include "appliance/store/TaskStore.h"
 #include "bench/FloorReporter.h"
 #include "bench/ModuleBench.h"
+#include "bench/RawTransaction.h"
 
 namespace orva {
 namespace {
@@ -149,16 +150,9 @@ TypedAppliance& Appliance() {
     return appliance;
 }
 
-// A copy of the database under SQLite alone, with the store's durability.
 SQLite::Database& RawDatabase() {
-    static SQLite::Database raw = [] {
-        const std::string path = (Appliance().Base().Root() / "raw.db").string();
-        SQLite::Database(Appliance().Base().Database().string(), SQLite::OPEN_READONLY)
-            .exec("VACUUM INTO '" + path + "'");
-        SQLite::Database database(path, SQLite::OPEN_READWRITE);
-        database.exec("PRAGMA journal_mode=WAL; PRAGMA synchronous=FULL");
-        return database;
-    }();
+    static SQLite::Database raw =
+        CopyDatabase(Appliance().Base().Database(), Appliance().Base().Root() / "raw.db");
     return raw;
 }
 
@@ -192,42 +186,19 @@ void Create(benchmark::State& state, const Kind& kind) {
     }
 }
 
-// Runs one prepared statement in a transaction of its own.
-class RawTransaction {
-  public:
-    explicit RawTransaction(const char* sql)
-        : begin(RawDatabase(), "BEGIN IMMEDIATE"),
-          statement(RawDatabase(), sql),
-          commit(RawDatabase(), "COMMIT") {}
-
-    void Run(int id) {
-        begin.exec();
-        begin.reset();
-        statement.bind(1, id);
-        statement.exec();
-        statement.reset();
-        commit.exec();
-        commit.reset();
-    }
-
-  private:
-    SQLite::Statement begin;
-    SQLite::Statement statement;
-    SQLite::Statement commit;
-};
-
 // Every column's text is built anew, as a change binds it anew.
 constexpr const char* kRawUpdate =
     "UPDATE task SET flags = flags + 1, name = name || '', owner = owner || '', app = app || '',"
     " app_name = app_name || '', app_args = app_args || '', action = action || '',"
-    " command = command || '', edit_form = edit_form || '' WHERE id = ?";
+    " command = command || '', edit_form = edit_form || '',"
+    " next_start = coalesce(next_start, 0) + 60 WHERE id = ?";
 constexpr const char* kRawInsert =
     "INSERT INTO task SELECT NULL, flags, name, owner, app, app_name, app_args, action, command,"
     " edit_form, mode, repeat, week_days, date, first_minute, interval_minutes, last_minute,"
     " run_missed, next_start FROM task WHERE id = ?";
 
 void WriteFloor(benchmark::State& state, const Kind& kind, const char* sql) {
-    RawTransaction transaction(sql);
+    RawTransaction transaction(RawDatabase(), {sql});
     const int id = Appliance().IdOf(kind);
     for (auto _ : state) {
         transaction.Run(id);
@@ -254,7 +225,7 @@ void SectionFloor(benchmark::State& state, const Kind& kind) {
 }
 
 void SectionAndWriteFloor(benchmark::State& state, const Kind& kind, const char* sql) {
-    RawTransaction transaction(sql);
+    RawTransaction transaction(RawDatabase(), {sql});
     const int id = Appliance().IdOf(kind);
     const std::string text = SectionOf(id);
     for (auto _ : state) {

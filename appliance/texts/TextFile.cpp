@@ -3,7 +3,10 @@
 #include <json/writer.h>
 
 #include <cstddef>
+#include <mutex>
 #include <optional>
+#include <string>
+#include <unordered_set>
 #include <utility>
 #include <vector>
 
@@ -51,6 +54,28 @@ std::string RemoveFaults(Json::Value& document) {
     return first;
 }
 
+// `name` for as long as the process lives. The names of texts are few and the same in every version
+// and language of a file.
+Json::StaticString Interned(const std::string& name) {
+    static std::mutex mutex;
+    static auto& names = *new std::unordered_set<std::string>;
+    const std::lock_guard lock(mutex);
+    return Json::StaticString(names.insert(name).first->c_str());
+}
+
+// The same document, cheaper to copy, which every request does: interned names are not copied.
+Json::Value WithInternedNames(const Json::Value& document) {
+    Json::Value interned(Json::objectValue);
+    for (auto section = document.begin(); section != document.end(); ++section) {
+        Json::Value& texts = interned[Interned(section.name())];
+        texts = Json::Value(Json::objectValue);
+        for (auto text = section->begin(); text != section->end(); ++text) {
+            texts[Interned(text.name())] = *text;
+        }
+    }
+    return interned;
+}
+
 }  // namespace
 
 Json::Value ParseTextFile(const std::string& content, std::string& error) {
@@ -62,7 +87,7 @@ Json::Value ParseTextFile(const std::string& content, std::string& error) {
     if (!fault.empty()) {
         error = std::move(fault);
     }
-    return std::move(*document);
+    return WithInternedNames(*document);
 }
 
 }  // namespace orva

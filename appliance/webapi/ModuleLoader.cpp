@@ -83,11 +83,13 @@ ModuleLoader::ModuleLoader(const std::string& directory) {
     const std::optional<LibraryFile> own = OwnLibrary();
     for (const std::string& file : ModuleFiles(directory)) {
         struct stat status {};
-        std::string reason;
-        if (::stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) {
-            reason = "it is no file";
-        } else if (own && status.st_dev == own->device && status.st_ino == own->inode) {
+        const bool regular = ::stat(file.c_str(), &status) == 0 && S_ISREG(status.st_mode);
+        if (own && status.st_dev == own->device && status.st_ino == own->inode) {
             continue;
+        }
+        std::string reason;
+        if (!regular) {
+            reason = "it is no file";
         } else if ((status.st_mode & S_IWOTH) != 0) {
             reason = "anybody may write it";
         } else if (Load(file, reason)) {
