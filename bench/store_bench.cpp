@@ -7,6 +7,9 @@
 #include <benchmark/benchmark.h>
 #include <sys/resource.h>
 
+#include <algorithm>
+#include <atomic>
+#include <chrono>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
@@ -14,10 +17,10 @@
 #include <memory>
 #include <stdexcept>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "appliance/root/Root.h"
-#include "appliance/schedule/StartTimes.h"
 #include "appliance/store/Database.h"
 #include "appliance/store/TaskStore.h"
 #include "appliance/store/TaskTable.h"
@@ -208,38 +211,37 @@ void LoadSetStateSave(benchmark::State& state) {
 }
 BENCHMARK(LoadSetStateSave)->Unit(benchmark::kMicrosecond)->UseRealTime();
 
-void NextStartOfADailyTask(benchmark::State& state) {
-    absl::TimeZone berlin;
-    absl::LoadTimeZone("Europe/Berlin", &berlin);
-    orva::Schedule schedule;
-    schedule.firstMinute = 390;
-    absl::Time now = absl::FromUnixSeconds(1790000000);
-    for (auto _ : state) {
-        now = *orva::NextStart(schedule, berlin, now);
-        if (now > absl::FromUnixSeconds(4000000000)) {
-            now = absl::FromUnixSeconds(1790000000);
-        }
-    }
+// Changes a task; how long that took, in milliseconds.
+double TimedSave(orva::TaskStore& store, int number) {
+    orva::TaskData task = Appliance::Task(number);
+    task.id = number % TaskCount() + 1;
+    const auto start = std::chrono::steady_clock::now();
+    store.Save(task);
+    return std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - start)
+        .count();
 }
-BENCHMARK(NextStartOfADailyTask)->Unit(benchmark::kNanosecond);
 
-void NextStartOfAMonthlySeries(benchmark::State& state) {
-    absl::TimeZone berlin;
-    absl::LoadTimeZone("Europe/Berlin", &berlin);
-    orva::Schedule schedule;
-    schedule.mode = orva::Schedule::Mode::kDate;
-    schedule.repeat = orva::Schedule::Repeat::kMonthly;
-    schedule.date = absl::CivilDay(2020, 1, 31);
-    schedule.intervalMinutes = 7;
-    absl::Time now = absl::FromUnixSeconds(1790000000);
-    for (auto _ : state) {
-        now = *orva::NextStart(schedule, berlin, now);
-        if (now > absl::FromUnixSeconds(4000000000)) {
-            now = absl::FromUnixSeconds(1790000000);
+// Two processes that change tasks without pause, and the longest that either has to wait for a
+// change of its own.
+void ChangeBesideAnotherWriter(benchmark::State& state) {
+    TheAppliance();
+    std::atomic<bool> stop = false;
+    double longestOfOther = 0;
+    std::thread other([&] {
+        for (int number = 0; !stop; ++number) {
+            longestOfOther = std::max(longestOfOther, TimedSave(OtherStore(), number));
         }
+    });
+    double longest = 0;
+    int number = 0;
+    for (auto _ : state) {
+        longest = std::max(longest, TimedSave(*orva::TaskStore::Current(), ++number));
     }
+    stop = true;
+    other.join();
+    state.counters["longest_ms"] = std::max(longest, longestOfOther);
 }
-BENCHMARK(NextStartOfAMonthlySeries)->Unit(benchmark::kNanosecond);
+BENCHMARK(ChangeBesideAnotherWriter)->Unit(benchmark::kMillisecond)->Iterations(300)->UseRealTime();
 
 }  // namespace
 

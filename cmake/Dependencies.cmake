@@ -1,6 +1,8 @@
 find_package(PkgConfig REQUIRED)
 find_package(Threads REQUIRED)
+pkg_check_modules(gnutls REQUIRED IMPORTED_TARGET gnutls)
 pkg_check_modules(jsoncpp REQUIRED IMPORTED_TARGET jsoncpp)
+pkg_check_modules(libsystemd REQUIRED IMPORTED_TARGET libsystemd)
 pkg_check_modules(microhttpd REQUIRED IMPORTED_TARGET libmicrohttpd)
 pkg_check_modules(sqlite3 REQUIRED IMPORTED_TARGET sqlite3)
 find_package(SQLiteCpp REQUIRED)

@@ -1,5 +1,7 @@
 // Application arguments that a task holds already, from an older version or a damaged store: the
 // first byte chooses the task's kind, "1" to "5", the rest is the text.
+#include <json/reader.h>
+
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -7,6 +9,7 @@
 #include "appliance/util/StrictJson.h"
 #include "fuzz/FilledPlatform.h"
 #include "fuzz/Require.h"
+#include "include/PlainJson.h"
 
 namespace {
 
@@ -14,6 +17,19 @@ constexpr unsigned kKinds = 5;
 
 void SetAgain(const FilledPlatform& platform, const Json::Value& parameters) {
     Require(Call(platform, "set", parameters).Succeeded(), "what was accepted once is again");
+}
+
+void ExpectPlainReadingToBeRight(const std::string& text) {
+    Json::Value plain;
+    if (!ReadPlainJson(text, {}, plain)) {
+        return;
+    }
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+    Json::Value ordinary;
+    Require(Json::Reader().parse(text, ordinary) && plain == ordinary,
+            "what is read quickly is read rightly");
+#pragma GCC diagnostic pop
 }
 
 }  // namespace
@@ -26,6 +42,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string bytes(reinterpret_cast<const char*>(data) + 1, size - 1);
     // The store's texts end at a NUL.
     const std::string text = bytes.substr(0, bytes.find('\0'));
+    ExpectPlainReadingToBeRight(text);
     FilledPlatform platform;
     platform.tasks[id].appArgs = text;
 

@@ -5,6 +5,7 @@
 
 #include <json/value.h>
 
+#include <span>
 #include <string>
 
 // Compact text of `value`, ended by a newline.
@@ -12,5 +13,7 @@ std::string WriteJsonText(const Json::Value& value);
 
 // Parses `text` into `value`. False when it is not JSON, with whatever the reader produced of it in
 // `value`, or when it is nested deeper than 1,000 levels, with null there. Never throws for its
-// text.
-bool ParseJsonText(const std::string& text, Json::Value& value);
+// text. Members named in `frequentNames` may get that name itself instead of a copy of it: worth
+// giving for the names that each element of a long array has.
+bool ParseJsonText(const std::string& text, Json::Value& value,
+                   std::span<const Json::StaticString> frequentNames = {});

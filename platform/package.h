@@ -4,6 +4,7 @@
 #pragma once
 
 #include <list>
+#include <memory>
 #include <string>
 
 namespace ORVAPackageTool {
@@ -38,7 +39,11 @@ class PackageManager {
     bool getPackageInfo(const std::string& id, PackageInfo& info, const PackageQuery* query) const;
 
   private:
+    struct Directory;
+
     std::list<std::string> ids;
+    // Open from init() on; null before that and where there is none.
+    std::shared_ptr<const Directory> directory;
 };
 
 }  // namespace ORVAPackageTool

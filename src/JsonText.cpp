@@ -3,11 +3,17 @@
 #include <json/reader.h>
 #include <json/writer.h>
 
+#include "include/PlainJson.h"
+
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
 
 std::string WriteJsonText(const Json::Value& value) { return Json::FastWriter().write(value); }
 
-bool ParseJsonText(const std::string& text, Json::Value& value) {
+bool ParseJsonText(const std::string& text, Json::Value& value,
+                   std::span<const Json::StaticString> frequentNames) {
+    if (ReadPlainJson(text, frequentNames, value)) {
+        return true;
+    }
     constexpr bool kCollectComments = true;
     try {
         return Json::Reader().parse(text, value, kCollectComments);

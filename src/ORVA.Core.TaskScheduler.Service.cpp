@@ -3,6 +3,7 @@
 
 #include <array>
 #include <cstring>
+#include <list>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -24,10 +25,12 @@ constexpr const char* kSourceFile = "ORVA.Core.TaskScheduler.Service.cpp";
 // The section that the task keeps, and the entries of its catalogue.
 constexpr const char* kStore = "service_store";
 constexpr const char* kStoredAction = "service_action";
-constexpr const char* kName = "name";
-constexpr const char* kDisplayName = "display_name";
-constexpr const char* kServiceType = "service_type";
-constexpr const char* kEnabled = "enabled";
+// Static texts: they are not copied into each of its many entries.
+const Json::StaticString kName("name");
+const Json::StaticString kDisplayName("display_name");
+const Json::StaticString kServiceType("service_type");
+const Json::StaticString kEnabled("enabled");
+const std::array kEntryNames = {kName, kDisplayName, kServiceType, kEnabled};
 
 constexpr const char* kStoredStop = "0";
 constexpr const char* kStoredStart = "1";
@@ -76,9 +79,12 @@ class StringHash {
     QLIBC_SZHASH* table;
 };
 
-bool IsOfType(const Json::Value& entry, int serviceType) {
-    const Json::Value& type = MemberOf(entry, kServiceType);
+bool IsType(const Json::Value& type, int serviceType) {
     return type.isInt() && type.asInt() == serviceType;
+}
+
+bool IsOfType(const Json::Value& entry, int serviceType) {
+    return IsType(MemberOf(entry, kServiceType), serviceType);
 }
 
 Json::Value NewEntry(const std::string& name, int serviceType, const std::string& displayName) {
@@ -115,8 +121,11 @@ int AddPackages(std::vector<Package>& packages) {
         syslog(LOG_ERR, "%s:%d init PackageManager failed", kSourceFile, 97);
         return -1;
     }
-    for (const std::string& id : manager.enumPackages(nullptr)) {
-        ORVAPackageTool::PackageInfo info;
+    // One for all: the texts of the next package take the place of the last one's.
+    ORVAPackageTool::PackageInfo info;
+    const std::list<std::string> ids = manager.enumPackages(nullptr);
+    packages.reserve(packages.size() + ids.size());
+    for (const std::string& id : ids) {
         const bool known = manager.getPackageInfo(id, info, nullptr);
         if (known && !info.startable) {
             continue;
@@ -139,11 +148,10 @@ Json::Value PackageEntry(const Package& package) {
     return NewEntry(package.id, kPackage, package.displayName);
 }
 
-// The entries of `stored`, which are used up, in their order and without the packages that are no
-// longer installed; then those that are new. False when memory is short; the line number is part of
-// the log's contract.
-bool RefreshCatalogue(Json::Value& stored, const std::vector<Package>& installed,
-                      Json::Value& refreshed) {
+// Drops the packages that are no longer installed from the entries of `catalogue`, which stay in
+// their order, and appends those that are new. False, with nothing changed, when memory is short;
+// the line number is part of the log's contract.
+bool RefreshCatalogue(Json::Value& catalogue, const std::vector<Package>& installed) {
     constexpr const char* kInstalled = "i";
     constexpr const char* kPresent = "-1";
 
@@ -156,39 +164,61 @@ bool RefreshCatalogue(Json::Value& stored, const std::vector<Package>& installed
         states.Set(package.id.c_str(), kInstalled);
     }
 
-    refreshed = Json::Value(Json::arrayValue);
-    if (stored.isArray()) {
-        for (Json::Value& entry : stored) {
-            if (!IsOfType(entry, kBuiltInService)) {
-                const Json::Value& name = MemberOf(entry, kName);
-                if (!name.isString() || states.Get(name.asCString()) == nullptr) {
-                    continue;
-                }
-                states.Set(name.asCString(), kPresent);
-            }
-            refreshed.append(std::move(entry));
-        }
+    if (!catalogue.isArray()) {
+        catalogue = Json::Value(Json::arrayValue);
     }
+    Json::ArrayIndex kept = 0;
+    auto place = catalogue.begin();
+    for (Json::Value& entry : catalogue) {
+        if (!IsOfType(entry, kBuiltInService)) {
+            const Json::Value& name = MemberOf(entry, kName);
+            if (!name.isString() || states.Get(name.asCString()) == nullptr) {
+                continue;
+            }
+            states.Set(name.asCString(), kPresent);
+        }
+        if (&*place != &entry) {
+            place->swap(entry);
+        }
+        ++place;
+        ++kept;
+    }
+    catalogue.resize(kept);
     for (const Package& package : installed) {
         const char* const state = states.Get(package.id.c_str());
         if (state != nullptr && std::strcmp(state, kPresent) != 0) {
-            refreshed.append(PackageEntry(package));
+            catalogue.append(PackageEntry(package));
         }
     }
     return true;
 }
 
+// Takes the member out of the object; null when it is missing.
+Json::Value TakeMember(Json::Value& object, const char* name) {
+    Json::Value value;
+    object.removeMember(name, &value);
+    return value;
+}
+
 // The form's element of one stored entry, in place.
 void EntryToForm(Json::Value& entry) {
-    entry["type"] = IsOfType(entry, kBuiltInService) ? "service" : "package";
-    entry["id"] = entry[kName];
-    if (IsOfType(entry, kPackage)) {
-        entry[kName] = std::move(entry[kDisplayName]);
+    static const Json::StaticString id("id");
+    static const Json::StaticString type("type");
+    static const Json::StaticString enable("enable");
+    static const Json::StaticString service("service");
+    static const Json::StaticString package("package");
+
+    const Json::Value serviceType = TakeMember(entry, kServiceType);
+    entry[type] = IsType(serviceType, kBuiltInService) ? service : package;
+    Json::Value displayName = TakeMember(entry, kDisplayName);
+    Json::Value& name = entry[kName];
+    if (IsType(serviceType, kPackage)) {
+        entry[id] = std::move(name);
+        name = std::move(displayName);
+    } else {
+        entry[id] = name;
     }
-    entry["enable"] = std::move(entry[kEnabled]);
-    for (const char* key : {kEnabled, kDisplayName, kServiceType}) {
-        entry.removeMember(key);
-    }
+    entry[enable] = TakeMember(entry, kEnabled);
 }
 
 std::string_view TextViewOf(const Json::Value& text) {
@@ -245,15 +275,13 @@ bool TaskSchedulerServiceHandler::ConvertToJson_App(const _tag_orva_sched_task_&
         app[kStoredAction] = kStoredStop;
     } else {
         const std::vector<Package> installed = InstalledPackages();
-        ParseJsonText(ORVASchedTaskGetAppArgs(task), app);
+        ParseJsonText(ORVASchedTaskGetAppArgs(task), app, kEntryNames);
         if (!app.isObject()) {
             app = Json::Value(Json::objectValue);
         }
-        Json::Value refreshed;
-        if (!RefreshCatalogue(app[kStore], installed, refreshed)) {
+        if (!RefreshCatalogue(app[kStore], installed)) {
             return false;
         }
-        app[kStore] = std::move(refreshed);
     }
     document["app"] = std::move(app);
     return true;

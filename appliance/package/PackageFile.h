@@ -7,6 +7,9 @@
 
 namespace orva {
 
+// The folder with a folder for each installed package, named after its id.
+inline constexpr const char* kPackages = "/usr/orva/packages";
+
 // What a package.json says: {"display_name": text, "startable": boolean, "start": command, "stop":
 // command, "status": command}. Only "display_name" must be there; a missing "startable" is false, a
 // missing command empty; other members are ignored. Nothing for anything else; `error` is then one

@@ -40,8 +40,9 @@ std::string ReadStandardInput() {
 }
 
 int Run(const Arguments& arguments) {
-    if (!orva::IsLanguageTag(arguments.language)) {
-        return WrongUsage("--lang takes a language such as de or de-AT");
+    if (!orva::FindLanguage(arguments.language) && arguments.language != orva::kDefaultLanguage) {
+        std::cerr << "orva-webapi: there are no texts for this --lang; those in "
+                  << orva::kDefaultLanguage << " are used\n";
     }
     const std::string document =
         arguments.document == "-" ? ReadStandardInput() : arguments.document;

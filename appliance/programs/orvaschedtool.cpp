@@ -1,115 +1,208 @@
-// Tasks in and out: orvaschedtool --import FILE | --export [FILE] | --list.
-
+// The task tool: one verb a call, each in a file of its own below appliance/tools/.
 #include <syslog.h>
 
 #include <CLI/CLI.hpp>
-#include <cstdio>
-#include <cstring>
-#include <iostream>
-#include <iterator>
+#include <charconv>
+#include <cstdint>
+#include <functional>
+#include <limits>
+#include <optional>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "appliance/root/Root.h"
 #include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskStore.h"
 #include "appliance/store/TaskTransfer.h"
-#include "appliance/util/AtomicFile.h"
-#include "appliance/util/FileRead.h"
+#include "appliance/tools/Beep.h"
+#include "appliance/tools/ComingStarts.h"
+#include "appliance/tools/History.h"
+#include "appliance/tools/Services.h"
+#include "appliance/tools/TaskFiles.h"
+#include "appliance/tools/ToolOutput.h"
 
 namespace {
 
-constexpr int kDone = 0;
-constexpr int kFailed = 1;
-constexpr int kUsage = 2;
+// The words of the command line.
+struct Arguments {
+    std::string root;
+    std::string importFile;
+    std::string exportFile;
+    bool list = false;
+    // The count and the task's id.
+    std::vector<int> next;
+    std::string historyTask;
+    std::int64_t outputRun = 0;
+    std::string beepSeconds;
+    std::vector<std::string> startServices;
+    std::vector<std::string> stopServices;
+    std::string from;
+    std::string zone;
+    bool json = false;
+};
 
-constexpr const char* kStandardStream = "-";
-// A file of this size is no list of tasks any more.
-constexpr std::size_t kLargestImport = std::size_t{512} * 1024 * 1024;
+struct Verb {
+    const CLI::Option* option;
+    std::function<int()> run;
+};
 
-int Complain(const std::string& about) {
-    std::fprintf(stderr, "orvaschedtool: %s\n", about.c_str());
-    return kFailed;
+std::vector<Verb> AddTaskVerbs(CLI::Option_group& verbs, Arguments& arguments) {
+    const CLI::Option* importing =
+        verbs
+            .add_option("--import", arguments.importFile,
+                        "Store the tasks of a JSON array, all or none (-: standard input). A task "
+                        "with the id of a stored one replaces that. Its id may be " +
+                            std::to_string(orva::kHighestImportedId) + " at most")
+            ->type_name("FILE");
+    const CLI::Option* exporting =
+        verbs
+            .add_option("--export", arguments.exportFile,
+                        "Write all tasks as a JSON array (without FILE: to standard output)")
+            ->type_name("FILE")
+            ->expected(0, 1)
+            ->default_str(orva::kStandardStream);
+    const CLI::Option* listing =
+        verbs.add_flag("--list", arguments.list, "Show all tasks, one line each");
+    return {
+        {importing, [&] { return orva::ImportTaskFile(arguments.importFile); }},
+        {exporting,
+         [&] {
+             return orva::ExportTaskFile(arguments.exportFile.empty() ? orva::kStandardStream
+                                                                      : arguments.exportFile);
+         }},
+        {listing, [] { return orva::ListTasks(); }},
+    };
 }
 
-int Import(const std::string& file) {
-    std::string json;
-    if (file == kStandardStream) {
-        json.assign(std::istreambuf_iterator<char>(std::cin), {});
-    } else {
-        orva::FileIdentity identity;
-        if (const int error = orva::ReadFile(file, kLargestImport, json, identity)) {
-            return Complain(file + ": " + std::strerror(error));
+std::optional<int> ParseTaskId(const std::string& text) {
+    int id = 0;
+    const char* end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, id);
+    return error == std::errc() && stop == end && id >= 1 ? std::optional(id) : std::nullopt;
+}
+
+std::vector<Verb> AddHistoryVerbs(CLI::Option_group& verbs, Arguments& arguments) {
+    constexpr int kHighest = std::numeric_limits<int>::max();
+    const CLI::Option* next =
+        verbs
+            .add_option("--next", arguments.next,
+                        "Show when task ID starts the next N times (1 to " +
+                            std::to_string(orva::ComingStartsRequest::kMost) + ")")
+            ->type_name("N ID")
+            ->expected(2)
+            ->check(CLI::Range(1, kHighest));
+    const CLI::Option* history =
+        verbs
+            .add_option("--history", arguments.historyTask,
+                        "Show the runs of task ID, or of all tasks, the newest first")
+            ->type_name("ID")
+            ->expected(0, 1)
+            ->default_str("");
+    const CLI::Option* output =
+        verbs.add_option("--output", arguments.outputRun, "Show what a run has printed")
+            ->type_name("RUN")
+            ->check(CLI::PositiveNumber);
+    return {
+        {next,
+         [&] {
+             orva::ComingStartsRequest request;
+             request.count = arguments.next.at(0);
+             request.task = arguments.next.at(1);
+             request.from = arguments.from;
+             request.zone = arguments.zone;
+             request.json = arguments.json;
+             return orva::ShowComingStarts(request);
+         }},
+        {history,
+         [&] {
+             if (arguments.historyTask.empty()) {
+                 return orva::ShowHistory({}, arguments.json);
+             }
+             const std::optional<int> task = ParseTaskId(arguments.historyTask);
+             if (!task) {
+                 orva::Complain("--history takes the id of a task");
+                 return orva::kToolUsage;
+             }
+             return orva::ShowHistory(task, arguments.json);
+         }},
+        {output, [&] { return orva::ShowRunOutput(arguments.outputRun); }},
+    };
+}
+
+std::vector<Verb> AddMachineVerbs(CLI::Option_group& verbs, Arguments& arguments) {
+    const CLI::Option* beep =
+        verbs
+            .add_option("--beep", arguments.beepSeconds,
+                        "Sound the machine's buzzer for 1 to 600 seconds; exit status 3 when there "
+                        "is none")
+            ->type_name("SECONDS");
+    const CLI::Option* start =
+        verbs.add_option("--start-service", arguments.startServices, "Start these services")
+            ->type_name("NAME...")
+            ->expected(1, std::numeric_limits<int>::max());
+    const CLI::Option* stop =
+        verbs.add_option("--stop-service", arguments.stopServices, "Stop these services")
+            ->type_name("NAME...")
+            ->expected(1, std::numeric_limits<int>::max());
+    return {
+        {beep, [&] { return orva::Beep(arguments.beepSeconds); }},
+        {start, [&] { return orva::StartServices(arguments.startServices); }},
+        {stop, [&] { return orva::StopServices(arguments.stopServices); }},
+    };
+}
+
+int Run(const std::vector<Verb>& verbs) {
+    try {
+        for (const Verb& verb : verbs) {
+            if (verb.option->count() > 0) {
+                return verb.run();
+            }
         }
+    } catch (const orva::StoreFailure& failure) {
+        return orva::Complain("task store " + orva::ResolvePath(orva::TaskStore::kDatabaseFile) +
+                              ": " + failure.what());
     }
-    const orva::ImportResult result = orva::ImportTasks(*orva::TaskStore::Current(), json);
-    if (!result.problem.empty()) {
-        return Complain(file + ": " + result.problem + "; nothing was imported");
-    }
-    std::printf("%zu tasks imported\n", result.count);
-    return kDone;
-}
-
-int WriteOut(const std::string& text) {
-    const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
-    return std::fflush(stdout) == 0 && written ? kDone : Complain("cannot write the output");
-}
-
-int Export(const std::string& file) {
-    const std::string text = orva::ExportTasks(*orva::TaskStore::Current());
-    if (file == kStandardStream) {
-        return WriteOut(text);
-    }
-    return orva::WriteFileAtomically(file, text) == 0 ? kDone
-                                                      : Complain(file + ": cannot be written");
+    return orva::kToolUsage;
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    CLI::App app("The stored tasks of the appliance.");
-    std::string root;
-    std::string importFile;
-    std::string exportFile;
-    app.add_option("--root", root, "The directory that the appliance lives below")
+    Arguments arguments;
+    CLI::App app(
+        "The scheduled tasks of the appliance: in and out, what is coming and what happened; and "
+        "what tasks do to the machine itself.\n"
+        "Exit status: 0 done, 1 failed, 2 wrong usage.");
+    app.add_option("--root", arguments.root,
+                   "The directory that the appliance lives below (default: ORVA_ROOT, or /)")
         ->type_name("DIR");
-    CLI::Option_group* action = app.add_option_group("action");
-    const CLI::Option* importing =
-        action
-            ->add_option("--import", importFile,
-                         "Store the tasks of a JSON array, all or none (-: standard input). A "
-                         "task's own id may be " +
-                             std::to_string(orva::kHighestImportedId) + " at most")
-            ->type_name("FILE");
-    const CLI::Option* exporting =
-        action
-            ->add_option("--export", exportFile,
-                         "Write all tasks as a JSON array (without FILE: to standard output)")
-            ->type_name("FILE")
-            ->expected(0, 1)
-            ->default_str(kStandardStream);
-    bool listing = false;
-    action->add_flag("--list", listing, "Show all tasks, one line each");
-    action->require_option(1);
+    CLI::Option_group* group = app.add_option_group("verb");
+    std::vector<Verb> verbs = AddTaskVerbs(*group, arguments);
+    for (auto* add : {AddHistoryVerbs, AddMachineVerbs}) {
+        for (Verb& verb : add(*group, arguments)) {
+            verbs.push_back(std::move(verb));
+        }
+    }
+    group->require_option(1);
+    app.add_option("--from", arguments.from,
+                   "With --next: later than this UTC instant (default: now)")
+        ->type_name("2027-01-31T12:00:00Z")
+        ->needs("--next");
+    app.add_option("--zone", arguments.zone,
+                   "With --next: in this time zone (default: the machine's)")
+        ->type_name("NAME")
+        ->needs("--next");
+    app.add_flag("--json", arguments.json, "With --next and --history: one JSON array");
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? kDone : kUsage;
+        return app.exit(error) == 0 ? orva::kToolDone : orva::kToolUsage;
     }
 
     openlog("orvaschedtool", LOG_PID, LOG_USER);
-    if (!root.empty()) {
-        orva::SetRoot(root);
+    if (!arguments.root.empty()) {
+        orva::SetRoot(arguments.root);
     }
-    try {
-        if (importing->count() > 0) {
-            return Import(importFile);
-        }
-        if (exporting->count() > 0) {
-            return Export(exportFile.empty() ? kStandardStream : exportFile);
-        }
-        return WriteOut(orva::TaskOverview(*orva::TaskStore::Current()));
-    } catch (const orva::StoreFailure& failure) {
-        return Complain("task store " + orva::ResolvePath(orva::TaskStore::kDatabaseFile) + ": " +
-                        failure.what());
-    }
+    return Run(verbs);
 }

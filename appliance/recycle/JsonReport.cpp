@@ -169,7 +169,8 @@ class JsonReport final : public CleanReport {
         text += KindWord(entry.kind);
         text += "\",\"bytes\":" + std::to_string(entry.bytes);
         if (entry.kind != FileKind::kDirectory) {
-            text += ",\"age_days\":" + DaysBetween(entry.changed, now);
+            text += ",\"since\":\"" + UtcText(entry.changed) +
+                    "\",\"age_days\":" + DaysBetween(entry.changed, now);
         }
         return text;
     }

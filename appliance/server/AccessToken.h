@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+#include "appliance/server/Secret.h"
+
 namespace orva {
 
 // The secret that every caller of the web API presents: 256 random bits as 64 hexadecimal digits.
@@ -15,8 +17,14 @@ class AccessToken {
     // cannot be made, holds something else, belongs to a stranger, or others may read or write it.
     static std::optional<AccessToken> LoadOrCreate(const std::string& file, std::string& error);
 
+    // As LoadOrCreate, but a missing file is a failure too.
+    static std::optional<AccessToken> Load(const std::string& file, std::string& error);
+
     // Takes the same time for every text of the token's length.
     bool Matches(std::string_view presented) const;
+
+    // A digest of `text` that only the token's holder can make.
+    Sha256Digest Sign(std::string_view text) const;
 
   private:
     explicit AccessToken(std::string digits) : token(std::move(digits)) {}

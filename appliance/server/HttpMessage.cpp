@@ -1,9 +1,20 @@
 #include "appliance/server/HttpMessage.h"
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+
 #include <algorithm>
+#include <cstring>
 
 namespace orva {
 namespace {
+
+constexpr std::array<std::uint8_t, 12> kMappedPrefix = {0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0xFF, 0xFF};
+constexpr std::ptrdiff_t kNetworkBytes = 8;
+
+bool IsMapped(const PeerAddress& address) {
+    return std::equal(kMappedPrefix.begin(), kMappedPrefix.end(), address.begin());
+}
 
 char Lower(char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; }
 
@@ -67,6 +78,13 @@ bool EqualIgnoringCase(std::string_view a, std::string_view b) {
                                               [](char x, char y) { return Lower(x) == Lower(y); });
 }
 
+std::string_view TrimBlanks(std::string_view text) {
+    const std::size_t first = text.find_first_not_of(" \t");
+    const std::size_t last = text.find_last_not_of(" \t");
+    return first == std::string_view::npos ? std::string_view()
+                                           : text.substr(first, last - first + 1);
+}
+
 std::optional<std::string_view> HttpRequest::Header(std::string_view name) const {
     for (const auto& [field, value] : headers) {
         if (EqualIgnoringCase(field, name)) {
@@ -89,6 +107,40 @@ std::optional<std::string_view> HttpRequest::Query(std::string_view name) const 
         }
     }
     return std::nullopt;
+}
+
+std::optional<PeerAddress> ToPeerAddress(const sockaddr* address) {
+    if (address == nullptr) {
+        return std::nullopt;
+    }
+    PeerAddress peer{};
+    if (address->sa_family == AF_INET) {
+        sockaddr_in ipv4{};
+        std::memcpy(&ipv4, address, sizeof ipv4);
+        std::copy(kMappedPrefix.begin(), kMappedPrefix.end(), peer.begin());
+        std::memcpy(&peer[kMappedPrefix.size()], &ipv4.sin_addr, sizeof ipv4.sin_addr);
+        return peer;
+    }
+    if (address->sa_family == AF_INET6) {
+        sockaddr_in6 ipv6{};
+        std::memcpy(&ipv6, address, sizeof ipv6);
+        std::memcpy(peer.data(), &ipv6.sin6_addr, peer.size());
+        if (!IsMapped(peer)) {
+            std::fill(peer.begin() + kNetworkBytes, peer.end(), std::uint8_t{0});
+        }
+        return peer;
+    }
+    return std::nullopt;
+}
+
+std::string ToText(const PeerAddress& address) {
+    char text[INET6_ADDRSTRLEN] = "";
+    if (IsMapped(address)) {
+        ::inet_ntop(AF_INET, &address[kMappedPrefix.size()], text, sizeof text);
+    } else {
+        ::inet_ntop(AF_INET6, address.data(), text, sizeof text);
+    }
+    return text;
 }
 
 bool ParseTarget(std::string_view target, HttpRequest& request) {

@@ -9,6 +9,7 @@
 #include <charconv>
 #include <new>
 #include <string_view>
+#include <vector>
 
 namespace orva {
 namespace {
@@ -37,11 +38,17 @@ struct Exchange {
     std::string target;
     HttpRequest request;
     std::optional<HttpResponse> refusal;
+    std::size_t largestBody = 0;
     bool headSeen = false;
     bool closeAfter = false;
     bool lingerAfter = false;
     std::size_t thrownAway = 0;
 };
+
+constexpr char kTlsPriorities[] = "NORMAL:-VERS-ALL:+VERS-TLS1.3:+VERS-TLS1.2";
+
+// The library takes its options as pointers to what it might change, and changes nothing.
+void* Modifiable(const char* text) { return const_cast<char*>(text); }
 
 struct DaemonStopper {
     void operator()(MHD_Daemon* daemon) const { ::MHD_stop_daemon(daemon); }
@@ -82,14 +89,30 @@ std::size_t AnnouncedBody(const HttpRequest& request) {
 
 void FreeBody(void* body) { delete static_cast<std::string*>(body); }
 
-ResponsePtr MakeResponse(HttpResponse&& from) {
-    auto body = std::make_unique<std::string>(std::move(from.body));
+ResponsePtr WithBody(std::string&& text) {
+    auto body = std::make_unique<std::string>(std::move(text));
     ResponsePtr response(::MHD_create_response_from_buffer_with_free_callback_cls(
         body->size(), body->data(), &FreeBody, body.get()));
+    if (response != nullptr) {
+        static_cast<void>(body.release());
+    }
+    return response;
+}
+
+ResponsePtr WithFile(FileDescriptor& file, std::uint64_t size) {
+    ResponsePtr response(::MHD_create_response_from_fd64(size, file.Get()));
+    if (response != nullptr) {
+        static_cast<void>(file.Release());
+    }
+    return response;
+}
+
+ResponsePtr MakeResponse(HttpResponse&& from) {
+    ResponsePtr response =
+        from.file.IsOpen() ? WithFile(from.file, from.fileSize) : WithBody(std::move(from.body));
     if (response == nullptr) {
         return nullptr;
     }
-    static_cast<void>(body.release());
     for (const auto& [name, value] : from.headers) {
         if (::MHD_add_response_header(response.get(), name.c_str(), value.c_str()) != MHD_YES) {
             return nullptr;
@@ -133,8 +156,16 @@ class HttpServer::Impl {
     ~Impl() { StopAccepting(); }
 
     bool Start() {
-        const unsigned flags = MHD_USE_THREAD_PER_CONNECTION | MHD_USE_INTERNAL_POLLING_THREAD |
-                               MHD_USE_POLL | MHD_USE_ITC;
+        unsigned flags = MHD_USE_THREAD_PER_CONNECTION | MHD_USE_INTERNAL_POLLING_THREAD |
+                         MHD_USE_POLL | MHD_USE_ITC;
+        std::vector<MHD_OptionItem> more;
+        if (options.tls) {
+            flags |= MHD_USE_TLS;
+            more = {{MHD_OPTION_HTTPS_MEM_CERT, 0, Modifiable(options.tls->certificates.c_str())},
+                    {MHD_OPTION_HTTPS_MEM_KEY, 0, Modifiable(options.tls->key.c_str())},
+                    {MHD_OPTION_HTTPS_PRIORITIES, 0, Modifiable(kTlsPriorities)}};
+        }
+        more.push_back({MHD_OPTION_END, 0, nullptr});
         daemon.reset(::MHD_start_daemon(
             flags, 0, &OnAccept, this, &OnRequest, this,                              //
             MHD_OPTION_LISTEN_SOCKET, socket.Descriptor(),                            //
@@ -146,6 +177,7 @@ class HttpServer::Impl {
             MHD_OPTION_NOTIFY_CONNECTION, &OnConnection, this,                        //
             MHD_OPTION_URI_LOG_CALLBACK, &OnRequestLine, this,                        //
             MHD_OPTION_NOTIFY_COMPLETED, &OnCompleted, this,                          //
+            MHD_OPTION_ARRAY, more.data(),                                            //
             MHD_OPTION_END));
         return daemon != nullptr;
     }
@@ -245,6 +277,8 @@ class HttpServer::Impl {
     MHD_Result TakeHead(MHD_Connection* connection, const char* method, Exchange& exchange) {
         HttpRequest& request = exchange.request;
         request.method = method;
+        request.peer = ToPeerAddress(
+            ::MHD_get_connection_info(connection, MHD_CONNECTION_INFO_CLIENT_ADDRESS)->client_addr);
         request.headers.reserve(16);
         ::MHD_get_connection_values_n(connection, MHD_HEADER_KIND, &CollectHeader, &request);
         const bool chunked = request.CountHeaders("Transfer-Encoding") > 0;
@@ -265,8 +299,9 @@ class HttpServer::Impl {
         } else {
             exchange.refusal = handler.Admit(request);
         }
-        if (!exchange.refusal && announced > options.largestBody) {
-            exchange.refusal = TooLarge();
+        exchange.largestBody = std::min(options.largestBody, handler.LargestBody(request));
+        if (!exchange.refusal && announced > exchange.largestBody) {
+            exchange.refusal = TooLarge(exchange);
         }
         if (exchange.refusal) {
             // A small body is read and thrown away, so that the connection can be used again; a
@@ -281,12 +316,12 @@ class HttpServer::Impl {
     MHD_Result TakeBody(std::string_view piece, Exchange& exchange) const {
         if (!exchange.refusal) {
             std::string& body = exchange.request.body;
-            if (piece.size() <= options.largestBody - body.size()) {
+            if (piece.size() <= exchange.largestBody - body.size()) {
                 body += piece;
                 return MHD_YES;
             }
             body = std::string();
-            exchange.refusal = TooLarge();
+            exchange.refusal = TooLarge(exchange);
             exchange.closeAfter = true;
         }
         // The library takes no answer in the middle of a body.
@@ -317,9 +352,9 @@ class HttpServer::Impl {
         return Answer(connection, exchange);
     }
 
-    HttpResponse TooLarge() const {
+    HttpResponse TooLarge(const Exchange& exchange) const {
         return handler.Refuse(
-            413, "the body is larger than " + std::to_string(options.largestBody) + " bytes");
+            413, "the body is larger than " + std::to_string(exchange.largestBody) + " bytes");
     }
 
     ListenSocket socket;
@@ -331,8 +366,14 @@ class HttpServer::Impl {
     std::unique_ptr<MHD_Daemon, DaemonStopper> daemon;
 };
 
+std::size_t HttpHandler::LargestBody(const HttpRequest& /*request*/) const { return SIZE_MAX; }
+
 std::unique_ptr<HttpServer> HttpServer::Start(ListenSocket socket, HttpHandler& handler,
                                               const Options& options, std::string& error) {
+    if (options.tls && ::MHD_is_feature_supported(MHD_FEATURE_TLS) != MHD_YES) {
+        error = "the HTTP library was built without TLS";
+        return nullptr;
+    }
     auto impl = std::make_unique<Impl>(std::move(socket), handler, options);
     if (!impl->Start()) {
         error = "the HTTP server cannot start";

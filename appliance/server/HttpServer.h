@@ -9,6 +9,7 @@
 #include "appliance/server/ConnectionTable.h"
 #include "appliance/server/HttpMessage.h"
 #include "appliance/server/ListenSocket.h"
+#include "appliance/server/TlsIdentity.h"
 
 namespace orva {
 
@@ -18,9 +19,13 @@ class HttpHandler {
   public:
     virtual ~HttpHandler() = default;
 
-    // The request's head has arrived, its body has not. An answer refuses the request: the body is
-    // thrown away as it comes.
+    // The request's head has arrived, its body has not. An answer, a refusal or one that needs no
+    // body, is all that happens: the body is thrown away as it comes.
     virtual std::optional<HttpResponse> Admit(const HttpRequest& request) = 0;
+
+    // How many bytes of body an admitted request may bring, where that is less than the server's
+    // own limit.
+    virtual std::size_t LargestBody(const HttpRequest& request) const;
 
     // The whole request has arrived.
     virtual HttpResponse Serve(const HttpRequest& request) = 0;
@@ -41,6 +46,8 @@ class HttpServer {
         // How long a connection that is closed after a refusal goes on throwing away what the
         // client still sends: closed at once, the client might lose the answer.
         std::chrono::milliseconds linger{2'000};
+        // Callers come by TLS when there is one.
+        std::optional<TlsIdentity> tls;
     };
 
     // Serves until it is destroyed. `handler` outlives it. Null, with the reason, when it cannot

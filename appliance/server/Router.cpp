@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <string_view>
 
+#include "appliance/server/JsonAnswer.h"
 #include "appliance/webapi/Language.h"
 
 namespace orva {
@@ -12,11 +13,12 @@ namespace {
 
 constexpr std::string_view kCataloguePath = "/webapi";
 constexpr std::string_view kCallPrefix = "/webapi/";
+constexpr std::string_view kSessionPath = "/session";
 
-enum class Place { kNone, kCatalogue, kCall };
+enum class Place { kPage, kCatalogue, kCall, kSession };
 
 struct Route {
-    Place place = Place::kNone;
+    Place place = Place::kPage;
     std::string_view api;
     std::string_view version;
     std::string_view method;
@@ -25,6 +27,9 @@ struct Route {
 Route FindRoute(std::string_view path) {
     if (path == kCataloguePath) {
         return {Place::kCatalogue, {}, {}, {}};
+    }
+    if (path == kSessionPath) {
+        return {Place::kSession, {}, {}, {}};
     }
     if (path.substr(0, kCallPrefix.size()) != kCallPrefix) {
         return {};
@@ -51,113 +56,80 @@ std::int32_t ReadVersion(std::string_view text) {
     return whole && version > 0 && text.front() != '0' ? version : 0;
 }
 
-// Whether the content type is JSON in UTF-8, which is JSON's only encoding between systems.
-bool IsJsonType(std::string_view field) {
-    const auto trim = [](std::string_view text) {
-        const std::size_t first = text.find_first_not_of(" \t");
-        const std::size_t last = text.find_last_not_of(" \t");
-        return first == std::string_view::npos ? std::string_view()
-                                               : text.substr(first, last - first + 1);
-    };
-    const std::size_t semicolon = field.find(';');
-    if (!EqualIgnoringCase(trim(field.substr(0, semicolon)), "application/json")) {
-        return false;
-    }
-    if (semicolon == std::string_view::npos) {
-        return true;
-    }
-    const std::string_view parameter = trim(field.substr(semicolon + 1));
-    return parameter.empty() || EqualIgnoringCase(parameter, "charset=utf-8") ||
-           EqualIgnoringCase(parameter, "charset=\"utf-8\"");
-}
+constexpr char kReadingMethods[] = "GET, HEAD";
 
-HttpResponse ToHttp(const ApiAnswer& answer) {
-    HttpResponse response;
-    response.status = answer.status;
-    response.headers = {{"Content-Type", "application/json; charset=utf-8"},
-                        {"Cache-Control", "no-store"},
-                        {"X-Content-Type-Options", "nosniff"}};
-    response.body = WriteAnswer(answer.response);
-    return response;
-}
-
-HttpResponse Error(int status, ApiError error, const std::string& message) {
-    return ToHttp(MakeErrorAnswer(status, error, message));
-}
-
-std::optional<HttpResponse> CheckHttpMethod(const HttpRequest& request, Place place) {
-    const bool allowed = place == Place::kCall
-                             ? request.method == "POST"
-                             : request.method == "GET" || request.method == "HEAD";
-    if (allowed) {
-        return std::nullopt;
-    }
-    HttpResponse response =
-        Error(405, ApiError::kMethodNotAllowed, "this place is not for that HTTP method");
-    response.headers.emplace_back("Allow", place == Place::kCall ? "POST" : "GET, HEAD");
-    return response;
+bool IsReading(const HttpRequest& request) {
+    return request.method == "GET" || request.method == "HEAD";
 }
 
 }  // namespace
 
-Router::Router(const Dispatcher& givenDispatcher, const AccessToken& givenToken)
-    : dispatcher(givenDispatcher), token(givenToken) {}
+Router::Router(const Dispatcher& givenDispatcher, Authenticator& givenAuthenticator,
+               const PageFiles& givenPage)
+    : dispatcher(givenDispatcher), authenticator(givenAuthenticator), page(givenPage) {}
 
 std::optional<HttpResponse> Router::Admit(const HttpRequest& request) {
     const Route route = FindRoute(request.path);
-    if (route.place == Place::kNone) {
-        return Error(404, ApiError::kNotFound, "there is nothing at this place");
+    if (route.place == Place::kPage) {
+        return ShowPage(request);
     }
-    if (std::optional<HttpResponse> refusal = CheckHttpMethod(request, route.place)) {
+    if (route.place == Place::kSession) {
+        return authenticator.AdmitSession(request);
+    }
+    const bool isCall = route.place == Place::kCall;
+    if (isCall ? request.method != "POST" : !IsReading(request)) {
+        return MethodNotAllowed(isCall ? "POST" : kReadingMethods);
+    }
+    if (std::optional<HttpResponse> refusal = authenticator.Refuse(request)) {
         return refusal;
     }
-    if (std::optional<HttpResponse> refusal = CheckToken(request)) {
-        return refusal;
-    }
-    if (route.place == Place::kCatalogue) {
+    if (!isCall) {
         return std::nullopt;
     }
     if (const std::optional<ApiAnswer> unknown =
             dispatcher.RefuseUnknown(route.api, ReadVersion(route.version), route.method)) {
-        return ToHttp(*unknown);
+        return JsonAnswer(*unknown);
     }
-    if (!IsJsonType(request.Header("Content-Type").value_or(""))) {
-        return Error(415, ApiError::kNotJsonType, "the content type must be application/json");
-    }
-    return std::nullopt;
+    return RefuseOtherThanJson(request);
+}
+
+std::size_t Router::LargestBody(const HttpRequest& request) const {
+    return FindRoute(request.path).place == Place::kSession ? Authenticator::kLargestSignIn
+                                                            : HttpHandler::LargestBody(request);
 }
 
 HttpResponse Router::Serve(const HttpRequest& request) {
     const Route route = FindRoute(request.path);
+    if (route.place == Place::kSession) {
+        return authenticator.SignIn(request);
+    }
     if (route.place != Place::kCall) {
-        ApiAnswer answer;
-        answer.response.SetSuccess(dispatcher.Catalogue().Describe());
-        return ToHttp(answer);
+        return JsonSuccess(dispatcher.Catalogue().Describe());
     }
     const std::string language =
         ChooseLanguage(request.Query("lang"), request.Header("Accept-Language").value_or(""));
-    return ToHttp(dispatcher.Call(route.api, ReadVersion(route.version), route.method, request.body,
-                                  language));
+    return JsonAnswer(dispatcher.Call(route.api, ReadVersion(route.version), route.method,
+                                      request.body, language));
 }
 
 HttpResponse Router::Refuse(int status, const std::string& reason) {
-    return Error(status, status == 413 ? ApiError::kTooLarge : ApiError::kBadRequest, reason);
+    return JsonError(status, status == 413 ? ApiError::kTooLarge : ApiError::kBadRequest, reason);
 }
 
-std::optional<HttpResponse> Router::CheckToken(const HttpRequest& request) const {
-    constexpr std::string_view kScheme = "Bearer ";
-    const std::string_view field = request.Header("Authorization").value_or("");
-    const bool presented = EqualIgnoringCase(field.substr(0, kScheme.size()), kScheme);
-    if (presented && request.CountHeaders("Authorization") == 1 &&
-        token.Matches(field.substr(kScheme.size()))) {
-        return std::nullopt;
+HttpResponse Router::ShowPage(const HttpRequest& request) const {
+    if (std::optional<HttpResponse> file = page.Find(request)) {
+        return IsReading(request) ? *std::move(file) : MethodNotAllowed(kReadingMethods);
     }
-    HttpResponse response =
-        Error(401, ApiError::kUnauthorized, "the access token is missing or wrong");
-    response.headers.emplace_back(
-        "WWW-Authenticate",
-        presented ? R"(Bearer realm="orva", error="invalid_token")" : R"(Bearer realm="orva")");
-    return response;
+    if (request.path == "/" && IsReading(request)) {
+        HttpResponse response;
+        response.status = 404;
+        response.headers = {{"Content-Type", "text/plain; charset=utf-8"},
+                            {"Cache-Control", "no-store"},
+                            {"X-Content-Type-Options", "nosniff"}};
+        response.body = "The browser page is not installed here. The web API is at /webapi.\n";
+        return response;
+    }
+    return JsonError(404, ApiError::kNotFound, "there is nothing at this place");
 }
 
 }  // namespace orva

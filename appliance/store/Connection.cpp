@@ -1,8 +1,11 @@
 #include "appliance/store/Connection.h"
 
 #include <SQLiteCpp/Exception.h>
+#include <sqlite3.h>
 
 #include <algorithm>
+#include <random>
+#include <thread>
 
 #include "appliance/store/StoreFailure.h"
 
@@ -17,14 +20,38 @@ constexpr const char* kSettings =
     "PRAGMA temp_store = MEMORY;"
     "PRAGMA trusted_schema = OFF;";
 
+constexpr std::chrono::microseconds kLongestWait{1000};
+
 constexpr const char* kWriteAheadLog = "wal";
 
 }  // namespace
 
 Connection::Connection(const std::string& file, std::chrono::milliseconds busyTimeout)
-    : database(file, SQLite::OPEN_READWRITE | SQLite::OPEN_NOMUTEX,
-               static_cast<int>(busyTimeout.count())) {
+    : patience(busyTimeout), database(file, SQLite::OPEN_READWRITE | SQLite::OPEN_NOMUTEX) {
+    sqlite3_busy_handler(
+        database.getHandle(),
+        [](void* connection, int attempts) {
+            return static_cast<Connection*>(connection)->WaitForOthers(attempts);
+        },
+        this);
     database.exec(kSettings);
+}
+
+// SQLite's own way of waiting sleeps longer each time, up to a tenth of a second. Whoever waits
+// here is the next to write (see Database::NextWriter), and all others wait with it: short sleeps
+// let it begin soon after the lock is free, and uneven ones fall into step with nobody who does not
+// queue.
+int Connection::WaitForOthers(int attempts) {
+    const auto now = std::chrono::steady_clock::now();
+    if (attempts == 0) {
+        waitingSince = now;
+    } else if (now - waitingSince >= patience) {
+        return 0;
+    }
+    thread_local std::minstd_rand random(std::random_device{}());
+    std::uniform_int_distribution<std::chrono::microseconds::rep> wait(1, kLongestWait.count());
+    std::this_thread::sleep_for(std::chrono::microseconds(wait(random)));
+    return 1;
 }
 
 Query Connection::Prepare(const char* sql) {

@@ -30,8 +30,11 @@ class Query {
 // Belongs to one thread at a time.
 class Connection {
   public:
-    // Opens an existing file and changes nothing in it.
+    // Opens an existing file and changes nothing in it. A statement that finds the database locked
+    // by others tries again for as long as `busyTimeout`.
     Connection(const std::string& file, std::chrono::milliseconds busyTimeout);
+    Connection(const Connection&) = delete;
+    Connection& operator=(const Connection&) = delete;
 
     // The statement, prepared at its first use and kept. `sql` must be a literal: it is known by
     // its address. One user at a time for each literal.
@@ -54,6 +57,10 @@ class Connection {
         SQLite::Statement statement;
     };
 
+    int WaitForOthers(int attempts);
+
+    const std::chrono::milliseconds patience;
+    std::chrono::steady_clock::time_point waitingSince;
     SQLite::Database database;
     // A deque: statements in use must not move.
     std::deque<Prepared> statements;

@@ -1,9 +1,12 @@
 #include "appliance/store/Database.h"
 
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <exception>
+#include <thread>
 #include <utility>
 
 #include "appliance/store/DatabaseFile.h"
@@ -15,6 +18,7 @@ namespace {
 
 // Enough for readers to run beside the one writer; each costs file descriptors and a page cache.
 constexpr std::size_t kMostConnections = 4;
+constexpr std::chrono::microseconds kNextWriterRetry{500};
 
 }  // namespace
 
@@ -55,6 +59,7 @@ void Database::ForgetFile() {
     idle.clear();
     ++generation;
     openFile = {};
+    directory = nullptr;
     const FileId formerLog = std::exchange(openLog, {});
     const std::string log = file + "-wal";
     if (formerLog == FileId() || Identify(log) != formerLog) {
@@ -77,6 +82,7 @@ std::unique_ptr<Connection> Database::OpenLocked() {
     auto connection = std::make_unique<Connection>(file, busyTimeout);
     if (openFile == FileId()) {
         Prepare(*connection);
+        directory = std::make_shared<const FileDescriptor>(OpenDatabaseDirectory(file));
         openFile = identity;
         openLog = Identify(file + "-wal");
     }
@@ -140,6 +146,31 @@ Database::WriteTurn::~WriteTurn() {
         database.turnTaken = false;
     }
     database.turnGivenBack.notify_one();
+}
+
+Database::NextWriter::NextWriter(Database& owner) {
+    {
+        const std::lock_guard lock(owner.mutex);
+        directory = owner.directory;
+    }
+    const auto deadline = std::chrono::steady_clock::now() + owner.busyTimeout;
+    while (directory != nullptr && ::flock(directory->Get(), LOCK_EX | LOCK_NB) != 0) {
+        if (errno != EWOULDBLOCK && errno != EINTR) {
+            directory = nullptr;
+        } else if (std::chrono::steady_clock::now() >= deadline) {
+            directory = nullptr;
+            throw StoreFailure(kErrDatabaseBusy, "changes by other processes take too long");
+        } else {
+            std::this_thread::sleep_for(kNextWriterRetry);
+        }
+    }
+}
+
+void Database::NextWriter::Yield() {
+    if (directory != nullptr) {
+        ::flock(directory->Get(), LOCK_UN);
+        directory = nullptr;
+    }
 }
 
 }  // namespace orva

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "appliance/store/Connection.h"
+#include "appliance/util/FileDescriptor.h"
 
 namespace orva {
 
@@ -64,6 +65,24 @@ class Database {
         Database& database;
     };
 
+    // The right of one process to be the next that writes, wanted until its transaction has begun.
+    // SQLite lets whoever asks at the right moment write, which is nearly always the one that wrote
+    // last: others would wait for seconds beside a process that writes without pause. Held as the
+    // lock of the database's directory; where its file system has none, everybody is the next.
+    class NextWriter {
+      public:
+        explicit NextWriter(Database& owner);
+        ~NextWriter() { Yield(); }
+        NextWriter(const NextWriter&) = delete;
+        NextWriter& operator=(const NextWriter&) = delete;
+
+        // Lets the others queue up.
+        void Yield();
+
+      private:
+        std::shared_ptr<const FileDescriptor> directory;
+    };
+
   private:
     struct FileId {
         std::uint64_t device = 0;
@@ -89,6 +108,8 @@ class Database {
     // first one is open.
     FileId openFile;
     FileId openLog;
+    // Of this generation's file; null before the first connection is open.
+    std::shared_ptr<const FileDescriptor> directory;
 
     std::mutex turnMutex;
     std::condition_variable turnGivenBack;
@@ -99,13 +120,16 @@ class Database {
 class WriteTransaction {
   public:
     explicit WriteTransaction(Database& database)
-        : turn(database), lease(database), transaction(*lease) {}
+        : turn(database), lease(database), next(database), transaction(*lease) {
+        next.Yield();
+    }
     Connection& operator*() { return *lease; }
     void Commit() { transaction.Commit(); }
 
   private:
     Database::WriteTurn turn;
     Database::Lease lease;
+    Database::NextWriter next;
     Transaction transaction;
 };
 

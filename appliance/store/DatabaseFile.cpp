@@ -88,11 +88,16 @@ void CheckDatabaseFile(const std::string& file) {
     }
 }
 
-FileDescriptor LockDatabaseDirectory(const std::string& file, std::chrono::milliseconds timeout) {
+FileDescriptor OpenDatabaseDirectory(const std::string& file) {
     FileDescriptor directory(::open(DirectoryOf(file).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (!directory.IsOpen()) {
         FailBySystem("cannot open its directory");
     }
+    return directory;
+}
+
+FileDescriptor LockDatabaseDirectory(const std::string& file, std::chrono::milliseconds timeout) {
+    FileDescriptor directory = OpenDatabaseDirectory(file);
     const auto deadline = std::chrono::steady_clock::now() + timeout;
     while (::flock(directory.Get(), LOCK_EX | LOCK_NB) != 0) {
         if (errno != EWOULDBLOCK && errno != EINTR) {

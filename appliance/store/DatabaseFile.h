@@ -19,6 +19,9 @@ void CreateDatabaseFile(const std::string& file);
 // descriptor of the file would drop the locks that SQLite holds on it in this process.
 void CheckDatabaseFile(const std::string& file);
 
+// Opens the directory of `file`.
+FileDescriptor OpenDatabaseDirectory(const std::string& file);
+
 // Holds the lock of the directory of `file`, under which its processes create the database, bring
 // it to another schema or clear away what is left of a former one. Released with the descriptor.
 FileDescriptor LockDatabaseDirectory(const std::string& file, std::chrono::milliseconds timeout);

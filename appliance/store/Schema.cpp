@@ -62,6 +62,52 @@ constexpr std::array kMigrations = {
     );
     CREATE INDEX run_queued ON run(id) WHERE state = 'queued';
     )sql",
+    R"sql(
+    -- From a queue to a history. Instants are kept in milliseconds since 1970 UTC from here on, all
+    -- but `occurrence`, which the schedule gives in seconds.
+    -- States are 'queued', 'running', 'ended', 'skipped' and 'lost'.
+    ALTER TABLE run ADD COLUMN task_name TEXT NOT NULL DEFAULT '';
+    ALTER TABLE run ADD COLUMN why TEXT NOT NULL DEFAULT '';
+    ALTER TABLE run ADD COLUMN started_at INTEGER;
+    ALTER TABLE run ADD COLUMN ended_at INTEGER;
+    ALTER TABLE run ADD COLUMN exit_status INTEGER;
+    ALTER TABLE run ADD COLUMN signal INTEGER;
+    ALTER TABLE run ADD COLUMN output_bytes INTEGER NOT NULL DEFAULT 0;
+    -- The process that supervises the run: the machine's boot, the process id and, in clock ticks
+    -- since that boot, its start. Together they name one process for ever.
+    ALTER TABLE run ADD COLUMN boot_id TEXT NOT NULL DEFAULT '';
+    ALTER TABLE run ADD COLUMN pid INTEGER;
+    ALTER TABLE run ADD COLUMN pid_start INTEGER;
+    UPDATE run SET queued_at = queued_at * 1000,
+        task_name = coalesce((SELECT name FROM task WHERE task.id = run.task), '');
+    CREATE INDEX run_of_task ON run(task, id);
+    -- Finds what waits and what goes on, and counts what ended.
+    CREATE INDEX run_in_state ON run(state, id);
+    DROP INDEX run_queued;
+
+    -- What a run printed: its first and last part, and how many bytes between them are gone. Apart
+    -- from the runs, so that a list of those reads no output.
+    CREATE TABLE run_output (
+        run INTEGER PRIMARY KEY,
+        head BLOB NOT NULL,
+        tail BLOB NOT NULL,
+        dropped INTEGER NOT NULL
+    );
+
+    -- One row, whose number grows with every change of a run.
+    CREATE TABLE run_revision (number INTEGER NOT NULL);
+    INSERT INTO run_revision VALUES (0);
+    CREATE TRIGGER run_added AFTER INSERT ON run BEGIN
+        UPDATE run_revision SET number = number + 1;
+    END;
+    CREATE TRIGGER run_changed AFTER UPDATE ON run BEGIN
+        UPDATE run_revision SET number = number + 1;
+    END;
+    CREATE TRIGGER run_gone AFTER DELETE ON run BEGIN
+        UPDATE run_revision SET number = number + 1;
+        DELETE FROM run_output WHERE run = OLD.id;
+    END;
+    )sql",
 };
 
 constexpr std::int64_t kVersion = static_cast<std::int64_t>(kMigrations.size());

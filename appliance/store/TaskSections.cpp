@@ -177,15 +177,17 @@ std::optional<SectionProblem> ApplyBasicSection(const Json::Value& basic, TaskDa
 }
 
 Json::Value BasicSection(const TaskData& task) {
+    // Static texts are not copied into the section; nearly every request builds one.
+    using Static = Json::StaticString;
     Json::Value basic(Json::objectValue);
-    basic["id"] = task.id;
-    basic["task_name"] = task.name;
-    basic["owner"] = task.owner;
-    basic["enabled"] = task.Has(kEnabled) ? "on" : "off";
-    basic["app"] = task.app;
-    basic["action"] = task.action;
+    basic[Static("id")] = task.id;
+    basic[Static("task_name")] = task.name;
+    basic[Static("owner")] = task.owner;
+    basic[Static("enabled")] = Static(task.Has(kEnabled) ? "on" : "off");
+    basic[Static("app")] = task.app;
+    basic[Static("action")] = task.action;
     for (const FlagName& each : kFlagNames) {
-        basic[each.name] = task.Has(each.flag);
+        basic[Static(each.name)] = task.Has(each.flag);
     }
     return basic;
 }

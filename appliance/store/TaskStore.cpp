@@ -1,10 +1,7 @@
 #include "appliance/store/TaskStore.h"
 
-#include <SQLiteCpp/Exception.h>
 #include <absl/time/clock.h>
 #include <errno.h>
-#include <sqlite3.h>
-#include <syslog.h>
 
 #include <algorithm>
 #include <cstdlib>
@@ -12,6 +9,7 @@
 
 #include "appliance/root/Root.h"
 #include "appliance/store/Accounts.h"
+#include "appliance/store/DatabaseGuard.h"
 #include "appliance/store/SchedulerLink.h"
 #include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskTable.h"
@@ -21,35 +19,6 @@ namespace {
 
 // Reading single tasks costs more than reading all of them when it is a good part of them.
 constexpr std::int64_t kMostChangesToFollow = 1000;
-
-ErrorCode CodeOf(const SQLite::Exception& error) {
-    switch (error.getErrorCode()) {
-        case SQLITE_BUSY:
-        case SQLITE_LOCKED:
-            return kErrDatabaseBusy;
-        case SQLITE_CORRUPT:
-        case SQLITE_NOTADB:
-            return kErrDatabaseCorrupt;
-        case SQLITE_FULL:
-        case SQLITE_READONLY:
-            return kErrDatabaseFull;
-        case SQLITE_NOMEM:
-            return kErrNoMemory;
-        default:
-            break;
-    }
-    switch (error.getExtendedErrorCode()) {
-        // The index of the log could not be made: on a full disk, nearly always.
-        case SQLITE_IOERR_SHMSIZE:
-        case SQLITE_IOERR_SHMOPEN:
-            return kErrDatabaseFull;
-        case SQLITE_IOERR_SHORT_READ:
-        case SQLITE_IOERR_CORRUPTFS:
-            return kErrDatabaseCorrupt;
-        default:
-            return kErrDatabase;
-    }
-}
 
 struct Stores {
     std::mutex mutex;
@@ -97,25 +66,8 @@ TaskStore::TaskStore(std::string databaseFile, const Options& optionsToUse)
     }
 }
 
-// Turns what SQLite reports into a StoreFailure, and logs what is the database's fault.
-template <class Operation>
-auto TaskStore::Guarded(Operation operation) -> decltype(operation()) {
-    try {
-        try {
-            return operation();
-        } catch (const SQLite::Exception& error) {
-            throw StoreFailure(CodeOf(error), error.what());
-        }
-    } catch (const StoreFailure& failure) {
-        if (failure.IsOfDatabase()) {
-            syslog(LOG_ERR, "task store %s: %s", database.File().c_str(), failure.what());
-        }
-        throw;
-    }
-}
-
 SharedTask TaskStore::Find(int id) {
-    return Guarded([&]() -> SharedTask {
+    return Guarded(database, [&]() -> SharedTask {
         Database::Lease lease(database);
         std::optional<TaskData> task = ReadTask(*lease, id);
         return task ? std::make_shared<const TaskData>(*std::move(task)) : nullptr;
@@ -123,7 +75,7 @@ SharedTask TaskStore::Find(int id) {
 }
 
 std::shared_ptr<const Snapshot> TaskStore::CurrentSnapshot() {
-    return Guarded([&] {
+    return Guarded(database, [&] {
         const std::lock_guard lock(snapshotMutex);
         try {
             return RefreshSnapshot(zone.Now(), options.clock());
@@ -158,7 +110,12 @@ std::shared_ptr<const Snapshot> TaskStore::RefreshSnapshot(const absl::TimeZone&
     // In one transaction: the version must be that of the rows.
     const ReadTransaction transaction(*observer);
     dataVersion = readVersion();
-    snapshot = std::make_shared<const Snapshot>(ReadTasks(), zoneNow, now);
+    // Runs come and go much more often than tasks change.
+    const bool sameTasks = snapshot != nullptr && NewestChange(*observer) == newestChange;
+    if (!sameTasks || !snapshot->HoldsFor(zoneNow, now)) {
+        snapshot = std::make_shared<const Snapshot>(sameTasks ? snapshot->Tasks() : ReadTasks(),
+                                                    zoneNow, now);
+    }
     return snapshot;
 }
 
@@ -191,13 +148,14 @@ std::vector<SharedTask> TaskStore::ReadTasks() {
 }
 
 int TaskStore::Save(const TaskData& task) {
-    const StartSecond nextStart = ComputeNextStart(task, zone.Now(), options.clock());
-    const int id = Guarded([&] {
+    const absl::Time now = options.clock();
+    const StartSecond nextStart = ComputeNextStart(task, zone.Now(), now);
+    const int id = Guarded(database, [&] {
         WriteTransaction transaction(database);
         int savedId = task.id;
         if (task.id == kNewTaskId) {
             savedId = InsertTask(*transaction, task, nextStart);
-        } else if (!UpdateTask(*transaction, task, nextStart)) {
+        } else if (!UpdateTask(*transaction, task, nextStart, now)) {
             throw StoreFailure(kErrNotFound, "no task " + std::to_string(task.id));
         }
         transaction.Commit();
@@ -210,14 +168,14 @@ int TaskStore::Save(const TaskData& task) {
 SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
     const absl::TimeZone zoneNow = zone.Now();
     const absl::Time now = options.clock();
-    SharedTask stored = Guarded([&] {
+    SharedTask stored = Guarded(database, [&] {
         WriteTransaction transaction(database);
         // Read under the write lock: nobody else changes the task from here to the commit.
         std::optional<TaskData> task = ReadTask(*transaction, base.id);
         if (task) {
             ApplyChange(base, changed, *task);
         }
-        if (!task || !UpdateTask(*transaction, *task, ComputeNextStart(*task, zoneNow, now))) {
+        if (!task || !UpdateTask(*transaction, *task, ComputeNextStart(*task, zoneNow, now), now)) {
             throw StoreFailure(kErrNotFound, "no task " + std::to_string(base.id));
         }
         transaction.Commit();
@@ -228,7 +186,7 @@ SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
 }
 
 void TaskStore::Remove(int id) {
-    Guarded([&] {
+    Guarded(database, [&] {
         WriteTransaction transaction(database);
         if (!RemoveTask(*transaction, id)) {
             throw StoreFailure(kErrNotFound, "no task " + std::to_string(id));
@@ -249,10 +207,10 @@ void TaskStore::QueueRun(int id) {
     if (!SchedulerLink::IsAlive()) {
         throw StoreFailure(kErrNoScheduler, "no scheduler is running");
     }
-    Guarded([&] {
+    Guarded(database, [&] {
         WriteTransaction transaction(database);
-        if (!orva::QueueRun(*transaction, id, absl::ToUnixSeconds(options.clock()),
-                            program_invocation_short_name, OwnAccount())) {
+        if (!orva::QueueRun(*transaction, id, options.clock(), program_invocation_short_name,
+                            OwnAccount())) {
             throw StoreFailure(kErrNotFound, "there is no such task");
         }
         transaction.Commit();
@@ -263,7 +221,7 @@ void TaskStore::QueueRun(int id) {
 void TaskStore::SaveAll(const std::vector<TaskData>& tasks) {
     const absl::TimeZone zoneNow = zone.Now();
     const absl::Time now = options.clock();
-    Guarded([&] {
+    Guarded(database, [&] {
         WriteTransaction transaction(database);
         const std::int64_t highest = HighestTaskId(*transaction);
         std::vector<const TaskData*> withoutId;
@@ -273,7 +231,7 @@ void TaskStore::SaveAll(const std::vector<TaskData>& tasks) {
             const StartSecond nextStart = ComputeNextStart(task, zoneNow, now);
             if (task.id > highest) {
                 InsertTask(*transaction, task, nextStart);
-            } else if (task.id == kNewTaskId || !UpdateTask(*transaction, task, nextStart)) {
+            } else if (task.id == kNewTaskId || !UpdateTask(*transaction, task, nextStart, now)) {
                 withoutId.push_back(&task);
             }
         }

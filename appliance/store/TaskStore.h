@@ -72,11 +72,13 @@ class TaskStore {
     absl::Time Now() const { return options.clock(); }
     absl::TimeZone Zone() { return zone.Now(); }
 
+    // The database that the tasks stand in, for what else is kept there. Lives as long as the
+    // store.
+    Database& UsedDatabase() { return database; }
+
   private:
     std::shared_ptr<const Snapshot> RefreshSnapshot(const absl::TimeZone& zoneNow, absl::Time now);
     std::vector<SharedTask> ReadTasks();
-    template <class Operation>
-    auto Guarded(Operation operation) -> decltype(operation());
 
     Options options;
     MachineZone zone;

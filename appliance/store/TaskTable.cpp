@@ -56,7 +56,15 @@ constexpr const char* kUpdate =
     "UPDATE task SET flags = ?2, name = ?3, owner = ?4, app = ?5, app_name = ?6, app_args = ?7, "
     "action = ?8, command = ?9, edit_form = ?10, mode = ?11, repeat = ?12, week_days = ?13, "
     "date = ?14, first_minute = ?15, interval_minutes = ?16, last_minute = ?17, run_missed = ?18, "
-    "next_start = ?19 WHERE id = ?1";
+    "next_start = CASE WHEN next_start <= ?20 THEN next_start ELSE ?19 END WHERE id = ?1";
+constexpr const char* kSelectDue =
+    "SELECT id, flags, name, owner, app, app_name, app_args, action, command, edit_form, mode, "
+    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start "
+    "FROM task WHERE next_start <= ? ORDER BY next_start, id LIMIT ?";
+constexpr const char* kSelectAfter =
+    "SELECT id, flags, name, owner, app, app_name, app_args, action, command, edit_form, mode, "
+    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start "
+    "FROM task WHERE id > ? ORDER BY id LIMIT ?";
 
 std::string TextOf(SQLite::Statement& row, int column) {
     // Not as a C string: a text may hold any byte.
@@ -119,6 +127,14 @@ TaskData TaskOf(SQLite::Statement& row) {
 // Parameters are numbered from 1, columns from 0.
 constexpr int Parameter(Column column) { return column + 1; }
 
+void BindStart(SQLite::Statement& statement, int parameter, StartSecond start) {
+    if (start == kNoStart) {
+        statement.bind(parameter);
+    } else {
+        statement.bind(parameter, start);
+    }
+}
+
 // `task` must live until the statement has run.
 void BindTask(SQLite::Statement& statement, const TaskData& task, StartSecond nextStart) {
     const Schedule& schedule = task.schedule;
@@ -148,11 +164,16 @@ void BindTask(SQLite::Statement& statement, const TaskData& task, StartSecond ne
     statement.bind(Parameter(kIntervalMinutes), schedule.intervalMinutes);
     statement.bind(Parameter(kLastMinute), schedule.lastMinute);
     statement.bind(Parameter(kRunMissed), schedule.runMissed ? 1 : 0);
-    if (nextStart == kNoStart) {
-        statement.bind(Parameter(kNextStart));
-    } else {
-        statement.bind(Parameter(kNextStart), nextStart);
+    BindStart(statement, Parameter(kNextStart), nextStart);
+}
+
+std::vector<StoredStart> StoredStartsOf(SQLite::Statement& rows) {
+    std::vector<StoredStart> starts;
+    while (rows.executeStep()) {
+        const SQLite::Column start = rows.getColumn(kNextStart);
+        starts.push_back({TaskOf(rows), start.isNull() ? kNoStart : start.getInt64()});
     }
+    return starts;
 }
 
 std::int64_t ReadNumber(Connection& connection, const char* sql) {
@@ -208,10 +229,12 @@ int InsertTask(Connection& connection, const TaskData& task, StartSecond nextSta
     return static_cast<int>(id);
 }
 
-bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart) {
+bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart,
+                absl::Time now) {
     {
         Query query = connection.Prepare(kUpdate);
         BindTask(*query, task, nextStart);
+        query->bind(Parameter(kNextStart) + 1, absl::ToUnixSeconds(now));
         if (query->exec() == 0) {
             return false;
         }
@@ -262,13 +285,40 @@ std::optional<std::vector<int>> TasksChangedAfter(Connection& connection, std::i
     return tasks;
 }
 
-bool QueueRun(Connection& connection, int task, std::int64_t nowSecond, const std::string& program,
+std::vector<StoredStart> ReadDueTasks(Connection& connection, absl::Time now, int most) {
+    Query query = connection.Prepare(kSelectDue);
+    query->bind(1, absl::ToUnixSeconds(now));
+    query->bind(2, most);
+    return StoredStartsOf(*query);
+}
+
+std::vector<StoredStart> ReadTasksAfter(Connection& connection, int after, int most) {
+    Query query = connection.Prepare(kSelectAfter);
+    query->bind(1, after);
+    query->bind(2, most);
+    return StoredStartsOf(*query);
+}
+
+StartSecond EarliestStart(Connection& connection) {
+    Query query = connection.Prepare(
+        "SELECT next_start FROM task WHERE next_start IS NOT NULL ORDER BY next_start LIMIT 1");
+    return query->executeStep() ? query->getColumn(0).getInt64() : kNoStart;
+}
+
+void SetNextStart(Connection& connection, int id, StartSecond start) {
+    Query query = connection.Prepare("UPDATE task SET next_start = ?2 WHERE id = ?1");
+    query->bind(1, id);
+    BindStart(*query, 2, start);
+    query->exec();
+}
+
+bool QueueRun(Connection& connection, int task, absl::Time now, const std::string& program,
               const std::string& account) {
     Query query = connection.Prepare(
-        "INSERT INTO run (task, reason, state, queued_at, asked_program, asked_account) "
-        "SELECT id, 'hand', 'queued', ?2, ?3, ?4 FROM task WHERE id = ?1");
+        "INSERT INTO run (task, task_name, reason, state, queued_at, asked_program, asked_account) "
+        "SELECT id, name, 'hand', 'queued', ?2, ?3, ?4 FROM task WHERE id = ?1");
     query->bind(1, task);
-    query->bind(2, nowSecond);
+    query->bind(2, absl::ToUnixMillis(now));
     query->bind(3, program);
     query->bind(4, account);
     return query->exec() > 0;

@@ -2,6 +2,8 @@
 // change something belong inside a Transaction.
 #pragma once
 
+#include <absl/time/time.h>
+
 #include <cstdint>
 #include <functional>
 #include <optional>
@@ -23,8 +25,10 @@ std::vector<SharedTask> ReadAllTasks(Connection& connection);
 // one when that is kNewTaskId.
 int InsertTask(Connection& connection, const TaskData& task, StartSecond nextStart);
 
-// Replaces the stored task with the id of `task`. False when there is none.
-[[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart);
+// Replaces the stored task with the id of `task`. A next start that has come by `now` stays as it
+// is: the scheduler has not seen it yet and puts it on record. False when there is no such task.
+[[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart,
+                              absl::Time now);
 
 // Removes the task with its queued runs. False when there is none.
 [[nodiscard]] bool RemoveTask(Connection& connection, int id);
@@ -40,8 +44,26 @@ std::int64_t NewestChange(Connection& connection);
 std::optional<std::vector<int>> TasksChangedAfter(Connection& connection, std::int64_t after,
                                                   std::int64_t most);
 
+// A task with its next start as it is stored.
+struct StoredStart {
+    TaskData task;
+    StartSecond start = kNoStart;
+};
+
+// Up to `most` tasks whose next start has come by `now`, in order of it.
+std::vector<StoredStart> ReadDueTasks(Connection& connection, absl::Time now, int most);
+
+// Up to `most` tasks with an id above `after`, by id.
+std::vector<StoredStart> ReadTasksAfter(Connection& connection, int after, int most);
+
+// The earliest next start of all tasks; kNoStart when there is none.
+StartSecond EarliestStart(Connection& connection);
+
+// Stores a task's next start and nothing else; does not count as a change of the task.
+void SetNextStart(Connection& connection, int id, StartSecond start);
+
 // Queues a run that was asked for by hand. False when there is no such task.
-[[nodiscard]] bool QueueRun(Connection& connection, int task, std::int64_t nowSecond,
+[[nodiscard]] bool QueueRun(Connection& connection, int task, absl::Time now,
                             const std::string& program, const std::string& account);
 
 }  // namespace orva

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <fcntl.h>
 #include <syslog.h>
 
 #include <cerrno>
@@ -43,9 +44,15 @@ class FileCache {
 
     // The parsed file at `path`; null when it does not exist or cannot be read.
     std::shared_ptr<const Parsed> Get(const std::string& path) {
+        return Get(path, AT_FDCWD, path.c_str());
+    }
+
+    // The same for a file that is found as `place` from the open directory `folder` too. Looks
+    // whether it has changed come cheaper from there.
+    std::shared_ptr<const Parsed> Get(const std::string& path, int folder, const char* place) {
         const std::shared_ptr<Entry> entry = EntryOf(path);
         FileIdentity identity;
-        const int error = GetFileIdentity(path, identity);
+        const int error = GetFileIdentityFrom(folder, place, identity);
         const std::lock_guard lock(entry->mutex);
         if (error != 0) {
             return Forget(*entry, path, error);

@@ -56,8 +56,12 @@ bool FileIdentity::IsSettled() const {
 }
 
 int GetFileIdentity(const std::string& path, FileIdentity& identity) {
+    return GetFileIdentityFrom(AT_FDCWD, path.c_str(), identity);
+}
+
+int GetFileIdentityFrom(int folder, const char* path, FileIdentity& identity) {
     struct stat status {};
-    if (::stat(path.c_str(), &status) != 0) {
+    if (::fstatat(folder, path, &status, 0) != 0) {
         return errno;
     }
     identity = IdentityOf(status);

@@ -190,19 +190,30 @@ std::string Describe(const char* fault, std::string_view text, std::size_t posit
            ": " + fault;
 }
 
-// jsoncpp's messages are several indented lines with a bullet each.
-std::string OneLine(const std::string& message) {
-    std::string line;
-    for (const char byte : message) {
-        const char shown = byte == '\n' || byte == '*' ? ' ' : byte;
-        if (shown != ' ' || (!line.empty() && line.back() != ' ')) {
-            line += shown;
-        }
-    }
-    while (!line.empty() && line.back() == ' ') {
+char Small(char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; }
+
+// Takes the next line from `text`, without its bullet, its indent and its full stop.
+std::string TakeLine(std::string_view& text) {
+    text.remove_prefix(std::min(text.find_first_not_of("* \n"), text.size()));
+    std::string line(text.substr(0, text.find('\n')));
+    text.remove_prefix(line.size());
+    if (!line.empty() && line.back() == '.') {
         line.pop_back();
     }
     return line;
+}
+
+// The first of jsoncpp's messages ("* Line 1, Column 2\n  Missing ...\n") as Describe() writes
+// them.
+std::string OneLine(std::string_view message) {
+    std::string place = TakeLine(message);
+    std::string fault = TakeLine(message);
+    if (fault.empty()) {
+        return place;
+    }
+    std::transform(place.begin(), place.end(), place.begin(), Small);
+    fault[0] = Small(fault[0]);
+    return place + ": " + fault;
 }
 
 std::unique_ptr<Json::CharReader> NewReader() {

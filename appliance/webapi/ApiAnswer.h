@@ -19,8 +19,10 @@ enum class ApiError : int {
     kNotFound = 107,          // the server has nothing at this place
     kMethodNotAllowed = 108,  // not with this HTTP method
     kTooLarge = 109,
-    kNotJsonType = 110,  // the content type is not JSON
-    kInternal = 111,     // the method failed without an answer
+    kNotJsonType = 110,     // the content type is not JSON
+    kInternal = 111,        // the method failed without an answer
+    kForeignOrigin = 112,   // a browser sent it from another server's page
+    kTooManyGuesses = 113,  // too many wrong tokens from this address
 };
 
 // What goes back to the caller: an HTTP status and what a method, or the server in its place, set.

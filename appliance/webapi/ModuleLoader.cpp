@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <optional>
 
 namespace orva {
 namespace {
@@ -14,31 +13,18 @@ namespace {
 // A table that has not ended by then lacks its last row.
 constexpr int kMostRows = 1024;
 
+// The platform itself, which stands beside the modules: this very file, or another appliance's when
+// a program works on a root that is not its own.
+constexpr char kPlatformLibrary[] = "liborva.so";
+
 using TableFunction = const ORVA::APITableRow* (*)();
-
-struct LibraryFile {
-    dev_t device;
-    ino_t inode;
-};
-
-// The file that holds this code: the platform's library.
-std::optional<LibraryFile> OwnLibrary() {
-    Dl_info info{};
-    struct stat status {};
-    const auto here = reinterpret_cast<const void*>(&OwnLibrary);
-    if (::dladdr(here, &info) == 0 || info.dli_fname == nullptr ||
-        ::stat(info.dli_fname, &status) != 0) {
-        return std::nullopt;
-    }
-    return LibraryFile{status.st_dev, status.st_ino};
-}
 
 std::vector<std::string> ModuleFiles(const std::string& directory) {
     std::vector<std::string> files;
     std::error_code error;
     std::filesystem::directory_iterator entry(directory, error);
     for (; !error && entry != std::filesystem::directory_iterator(); entry.increment(error)) {
-        if (entry->path().extension() == ".so") {
+        if (entry->path().extension() == ".so" && entry->path().filename() != kPlatformLibrary) {
             files.push_back(entry->path().string());
         }
     }
@@ -80,13 +66,9 @@ bool ReadTable(const ORVA::APITableRow* table, std::vector<ApiMethodEntry>& entr
 void ModuleLoader::LibraryCloser::operator()(void* library) const { ::dlclose(library); }
 
 ModuleLoader::ModuleLoader(const std::string& directory) {
-    const std::optional<LibraryFile> own = OwnLibrary();
     for (const std::string& file : ModuleFiles(directory)) {
         struct stat status {};
         const bool regular = ::stat(file.c_str(), &status) == 0 && S_ISREG(status.st_mode);
-        if (own && status.st_dev == own->device && status.st_ino == own->inode) {
-            continue;
-        }
         std::string reason;
         if (!regular) {
             reason = "it is no file";

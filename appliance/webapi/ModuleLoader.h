@@ -19,7 +19,7 @@ class ModuleLoader {
     // cannot be loaded, that anybody may write, that offers no table or a malformed one, or whose
     // table repeats a method that is already there, is left out as a whole, and one log line says
     // why. A directory that cannot be read holds no module, with a log line too. The platform's
-    // own library may stand in the same directory and is passed over.
+    // library, liborva.so, may stand in the same directory and is passed over.
     explicit ModuleLoader(const std::string& directory);
 
     const ApiCatalogue& Catalogue() const { return catalogue; }

@@ -97,6 +97,75 @@ TEST_F(OtherApplicationsTest, ASetOfAnyKindChangesNameOwnerStateAndScheduleOfTha
     }
 }
 
+TEST_F(OtherApplicationsTest, EachFieldOfASetChangesAloneWhateverTheKind) {
+    Import(OtherTasks());
+    Json::Value expected = Documents();
+    ASSERT_EQ(expected.size(), 5U);
+    for (Json::Value& task : expected) {
+        const std::string id = task["basic"]["id"].asString();
+        SCOPED_TRACE(task["basic"]["app"].asString());
+        const auto set = [&](const std::string& name, const std::string& owner, bool enable,
+                             const std::string& schedule) {
+            EXPECT_EQ(Body("set", R"({"id": )" + id + R"(, "name": ")" + name + R"(", "owner": ")" +
+                                      owner + R"(", "enable": )" + (enable ? "true" : "false") +
+                                      R"(, "schedule": )" + schedule + "}"),
+                      Success(R"({"id": )" + id + "}"));
+            EXPECT_EQ(Documents(), expected);
+        };
+        // Off, off again, on, on again: nothing else moves.
+        for (const bool enable : {false, false, true, true}) {
+            task["basic"]["enabled"] = enable ? "on" : "off";
+            set("Before", "daemon", enable, "{}");
+            const Json::Value form = AnswerDocument(Call("get", R"({"id": )" + id + "}"))["data"];
+            EXPECT_EQ(form["enable"], enable);
+        }
+        task["basic"]["task_name"] = "N\u00e4me 'x' \u65e5";
+        set("N\\u00e4me 'x' \\u65e5", "daemon", true, "{}");
+        task["basic"]["owner"] = "bin";
+        set("N\\u00e4me 'x' \\u65e5", "bin", true, "{}");
+        task["schedule"]["mode"] = "weekly";
+        task["schedule"]["week_name"] = "1,6";
+        task["schedule"]["hour"] = 23;
+        task["schedule"]["min"] = 59;
+        task["schedule"]["interval_min"] = 0;
+        set("N\\u00e4me 'x' \\u65e5", "bin", true,
+            R"({"mode": "weekly", "week_day": "1,6", "hour": 23, "minute": 59,
+                "interval_min": 0})");
+    }
+}
+
+TEST_F(OtherApplicationsTest, ATaskWhoseNameAndOwnerAreFixedIsStillSwitchedAndScheduled) {
+    std::string tasks = OtherTasks();
+    for (const char* flag : {R"("can_edit_name": true)", R"("can_edit_owner": true)"}) {
+        const std::string allowed = flag;
+        const std::string forbidden = allowed.substr(0, allowed.find("true")) + "false";
+        for (std::size_t at = tasks.find(allowed); at != std::string::npos;
+             at = tasks.find(allowed, at)) {
+            tasks.replace(at, allowed.size(), forbidden);
+        }
+    }
+    Import(tasks);
+    Json::Value expected = Documents();
+    ASSERT_EQ(expected.size(), 5U);
+    for (Json::Value& task : expected) {
+        const std::string id = task["basic"]["id"].asString();
+        SCOPED_TRACE(task["basic"]["app"].asString());
+        const auto set = [&](const std::string& name, const std::string& owner) {
+            return Body("set", R"({"id": )" + id + R"(, "name": ")" + name + R"(", "owner": ")" +
+                                   owner + R"(", "enable": false, "schedule": {"minute": 3}})");
+        };
+        const std::string refused =
+            orva::test::Failure(117, R"({"msg": "Invalid (basic) object"})");
+        EXPECT_EQ(set("After", "daemon"), refused);
+        EXPECT_EQ(set("Before", "bin"), refused);
+        EXPECT_EQ(Documents(), expected);
+        EXPECT_EQ(set("Before", "daemon"), Success(R"({"id": )" + id + "}"));
+        task["basic"]["enabled"] = "off";
+        task["schedule"]["min"] = 3;
+        EXPECT_EQ(Documents(), expected);
+    }
+}
+
 TEST_F(OtherApplicationsTest, ASecondIdenticalSetLeavesAnIdenticalRecord) {
     const struct {
         const char* type;

@@ -12,7 +12,6 @@
 namespace {
 
 using orva::test::AnswerDocument;
-using orva::test::ErrorCode;
 using orva::test::HttpAnswer;
 using orva::test::HttpConnection;
 using orva::test::PostRequest;

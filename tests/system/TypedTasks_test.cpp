@@ -170,10 +170,11 @@ std::string OtherTask(const std::string& app, const std::string& basic,
 }
 
 TEST_F(TypedTasksTest, ATaskOfAnotherApplicationKeepsWhatTheEditorDoesNotShow) {
-    const struct {
+    struct Kind {
         const char* app;
         const char* type;
-    } kinds[] = {
+    };
+    const Kind kinds[] = {
         {"ORVA.ZUM.BackupApp.NetBackup", "backup"},
         {"ORVA.ZUM.BackupApp.LocalBackup", "backup"},
         {"ORVA.ZUM.BackupApp.LUNBackup", "backup"},
@@ -184,7 +185,9 @@ TEST_F(TypedTasksTest, ATaskOfAnotherApplicationKeepsWhatTheEditorDoesNotShow) {
         {"Some.Other.App", "custom"},
     };
     int id = 0;
-    for (const auto& [app, type] : kinds) {
+    for (const Kind& kind : kinds) {
+        const char* const app = kind.app;
+        const char* const type = kind.type;
         SCOPED_TRACE(app);
         const std::string number = std::to_string(++id);
         const auto record = [&](const std::string& basic, const std::string& schedule) {

@@ -166,9 +166,23 @@ TEST_F(WebApiTest, RefusesAMissingWrongOrOverlongToken) {
                                      server.Token().substr(1), std::string(30'000, 'f')}) {
         ExpectRefused(server.Ask(PostRequest(kEchoTarget, token, "{}")), 401, 106);
     }
-    EXPECT_EQ(server.Ask(GetRequest("/webapi", wrong)).status, 401);
     EXPECT_EQ(server.Ask(GetRequest("/webapi", std::string(100'000, 'f'))).status, 431);
     EXPECT_EQ(server.Process().ErrorText(), "");
+}
+
+TEST_F(WebApiTest, LooksAtNoMoreThanFiveWrongTokens) {
+    server.Start();
+    const std::string wrong(64, '0');
+    for (int i = 0; i < 5; ++i) {
+        ExpectRefused(server.Ask(PostRequest(kEchoTarget, wrong, "{}")), 401, 106);
+    }
+    const HttpAnswer answer = server.Ask(GetRequest("/webapi", wrong));
+    ExpectRefused(answer, 429, 113);
+    EXPECT_THAT(answer.headers.at("retry-after"), testing::MatchesRegex("[1-9][0-9]?"));
+    EXPECT_THAT(server.Process().ErrorText(),
+                HasSubstr("127.0.0.1 presents wrong tokens; its further guesses are not looked "
+                          "at\n"));
+    EXPECT_THAT(server.Process().ErrorText(), testing::Not(HasSubstr(wrong)));
 }
 
 TEST_F(WebApiTest, GoesOnAfterMethodsThatFail) {

@@ -137,7 +137,7 @@ TEST_F(OrvaRecycleTest, NamesWhatAReadOnlyMountKeepsAndRemovesTheRest) {
     File("free/file");
     // The same file system, mounted into the bin at another place and read-only.
     fs::create_directories(sandbox.Path() / "store/deep");
-    std::ofstream(sandbox.Path() / "store/deep/precious");
+    const std::ofstream precious(sandbox.Path() / "store/deep/precious");
     const ProcessResult mounted =
         Shell(ownMounts,
               "mkdir $BIN/mounted && mount --bind $ORVA_ROOT/store $BIN/mounted && "

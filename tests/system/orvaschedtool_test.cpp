@@ -97,11 +97,42 @@ TEST_F(OrvaschedtoolTest, AStoreThatCannotBeOpenedIsNamed) {
     }
 }
 
+TEST_F(OrvaschedtoolTest, ComingStartsAreShownInTheZoneThatIsAskedFor) {
+    ASSERT_EQ(Run({"--import", "-"}, kTwoTasks).status, 0);
+    const ProcessResult next = Run(
+        {"--next", "2", "2", "--from", "2026-05-01T12:00:00Z", "--zone", "Asia/Kolkata", "--json"});
+    EXPECT_EQ(next.status, 0) << next.err;
+    EXPECT_EQ(next.out, R"([
+ {"local":"2026-05-02T03:00:00+05:30","utc":"2026-05-01T21:30:00Z"},
+ {"local":"2026-05-03T03:00:00+05:30","utc":"2026-05-02T21:30:00Z"}
+]
+)");
+    EXPECT_EQ(Run({"--json", "--next", "1", "3"}).err, "orvaschedtool: there is no task 3\n");
+}
+
+TEST_F(OrvaschedtoolTest, AHistoryWithoutRunsIsEmpty) {
+    ASSERT_EQ(Run({"--import", "-"}, kTwoTasks).status, 0);
+    EXPECT_EQ(Run({"--history", "--json"}).out, "[]\n");
+    EXPECT_EQ(Run({"--json", "--history", "1"}).out, "[]\n");
+    EXPECT_THAT(Run({"--history"}).out, testing::StartsWith("RUN "));
+    const ProcessResult output = Run({"--output", "1"});
+    EXPECT_EQ(output.status, 1);
+    EXPECT_EQ(output.err, "orvaschedtool: there is no run 1\n");
+}
+
 TEST_F(OrvaschedtoolTest, WrongUsageIsTold) {
     EXPECT_EQ(Run({}).status, 2);
     EXPECT_EQ(Run({"--list", "--export"}).status, 2);
     EXPECT_EQ(Run({"--import"}).status, 2);
     EXPECT_EQ(Run({"--no-such-switch"}).status, 2);
+    EXPECT_EQ(Run({"--next", "1"}).status, 2);
+    EXPECT_EQ(Run({"--next", "1", "x"}).status, 2);
+    EXPECT_EQ(Run({"--next", "0", "1"}).status, 2);
+    EXPECT_EQ(Run({"--list", "--from", "2026-05-01T12:00:00Z"}).status, 2);
+    EXPECT_EQ(Run({"--history", "x"}).status, 2);
+    EXPECT_EQ(Run({"--history", "--list"}).status, 2);
+    EXPECT_EQ(Run({"--output"}).status, 2);
+    EXPECT_EQ(Run({"--output", "-1"}).status, 2);
     EXPECT_EQ(Run({"--help"}).status, 0);
 }
 

@@ -47,7 +47,7 @@ TEST(PackageFileTest, RefusesOtherDocumentsAndSaysWhy) {
     EXPECT_EQ(errorOf(R"({"display_name": "a", "start": 1})"), noText);
     EXPECT_EQ(errorOf(R"({"display_name": "a", "stop": null})"), noText);
     EXPECT_EQ(errorOf(R"({"display_name": "a", "status": []})"), noText);
-    EXPECT_EQ(errorOf("{"), "Line 1, Column 2 Missing '}' or object member name");
+    EXPECT_EQ(errorOf("{"), "line 1, column 2: missing '}' or object member name");
 }
 
 }  // namespace

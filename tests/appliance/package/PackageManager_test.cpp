@@ -114,6 +114,49 @@ TEST_F(PackageManagerTest, SeesInstallationsAtTheNextInit) {
     EXPECT_THAT(manager.enumPackages(nullptr), IsEmpty());
 }
 
+TEST_F(PackageManagerTest, SeesWhatAPackageSaysNowWithoutAnotherInit) {
+    Install("a", R"({"display_name": "Old"})");
+    PackageManager manager;
+    ASSERT_TRUE(manager.init());
+    PackageInfo info;
+    ASSERT_TRUE(manager.getPackageInfo("a", info, nullptr));
+    EXPECT_EQ(info.displayName, "Old");
+    Install("a", R"({"display_name": "New", "start": "go"})");
+    ASSERT_TRUE(manager.getPackageInfo("a", info, nullptr));
+    EXPECT_EQ(info.displayName, "New");
+    EXPECT_EQ(info.startCommand, "go");
+    Install("a", R"({"display_name": "Newer"})");
+    ASSERT_TRUE(manager.getPackageInfo("a", info, nullptr));
+    EXPECT_EQ(info.displayName, "Newer");
+    EXPECT_EQ(info.startCommand, "");
+}
+
+TEST_F(PackageManagerTest, SeesAnotherDirectoryInThePlaceOfTheFirstAtTheNextInit) {
+    Install("a", R"({"display_name": "First"})");
+    PackageManager manager;
+    PackageInfo info;
+    ASSERT_TRUE(manager.init());
+    ASSERT_TRUE(manager.getPackageInfo("a", info, nullptr));
+    std::filesystem::rename(RootPath() + "/usr/orva/packages", RootPath() + "/former");
+    Install("a", R"({"display_name": "Second"})");
+    Install("b", R"({"display_name": "B"})");
+    ASSERT_TRUE(manager.init());
+    EXPECT_THAT(manager.enumPackages(nullptr), ElementsAre("a", "b"));
+    ASSERT_TRUE(manager.getPackageInfo("a", info, nullptr));
+    EXPECT_EQ(info.displayName, "Second");
+    std::filesystem::remove_all(RootPath() + "/usr/orva/packages");
+    ASSERT_TRUE(manager.init());
+    EXPECT_THAT(manager.enumPackages(nullptr), IsEmpty());
+    EXPECT_FALSE(manager.getPackageInfo("a", info, nullptr));
+}
+
+TEST_F(PackageManagerTest, ReadsADescriptionBeforeAnyInit) {
+    Install("a", R"({"display_name": "A"})");
+    PackageInfo info;
+    ASSERT_TRUE(PackageManager().getPackageInfo("a", info, nullptr));
+    EXPECT_EQ(info.displayName, "A");
+}
+
 TEST_F(PackageManagerTest, FailsWhenThePlaceOfThePackagesIsNoDirectory) {
     Write("/usr/orva/packages", "");
     PackageManager manager;

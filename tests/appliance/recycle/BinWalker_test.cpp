@@ -186,7 +186,7 @@ TEST_F(BinWalkerTest, NeverRemovesAFileOutsideWhileFoldersTurnIntoLinks) {
     for (int round = 0; round < kRounds; ++round) {
         std::error_code ignored;
         std::filesystem::create_directory(InBin("folder"), ignored);
-        std::ofstream(InBin("folder/file"));
+        const std::ofstream made(InBin("folder/file"));
         Walk([](const std::string&) {});
         ASSERT_TRUE(IsOutside("file")) << "round " << round;
     }

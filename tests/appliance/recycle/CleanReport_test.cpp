@@ -106,12 +106,13 @@ TEST(CleanReportTest, WritesOneDocument) {
     const auto expected = ParseStrictJson(R"({"dry_run": true, "at": "2024-10-04T00:00:00Z",
         "bins": [
             {"share": "photo",
-             "remove": [{"path": "a", "kind": "file", "bytes": 5, "age_days": 0.5},
+             "remove": [{"path": "a", "kind": "file", "bytes": 5,
+                         "since": "2024-10-03T12:00:00Z", "age_days": 0.5},
                         {"path": "c/", "kind": "folder", "bytes": 0}],
              "keep": [{"path": "b)"
                                           "\xEF\xBF\xBD"
                                           R"(", "path_base64": "Yv8=", "kind": "link", "bytes": 3,
-                       "age_days": 0.0, "reason": "age"}],
+                       "since": "2024-10-04T00:00:00Z", "age_days": 0.0, "reason": "age"}],
              "failures": [{"path": "d", "action": "read", "message": "Permission denied"}],
              "totals": {"removed_files": 1, "removed_bytes": 5, "removed_folders": 2,
                         "kept_files": 2, "kept_bytes": 30, "failures": 0, "over_limit_bytes": 0}},

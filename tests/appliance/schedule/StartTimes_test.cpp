@@ -190,6 +190,15 @@ TEST(StartTimes, MidnightThatDoesNotExistIsOneOClock) {
                 ElementsAre("2018-11-04 03:00:00", "2018-11-05 02:00:00"));
 }
 
+TEST(StartTimes, AZoneThatGaveUpChangingItsClockHasEvenDays) {
+    // Sao Paulo's last change was in February 2019.
+    EXPECT_THAT(Next(Daily(0), "America/Sao_Paulo", "2019-11-02 12:00:00", 3),
+                ElementsAre("2019-11-03 03:00:00", "2019-11-04 03:00:00", "2019-11-05 03:00:00"));
+    EXPECT_THAT(NextLocal(Series(0, 480, 2359), "Asia/Kolkata", "2026-03-28 18:30:00", 4),
+                ElementsAre("2026-03-29 08:00", "2026-03-29 16:00", "2026-03-30 00:00",
+                            "2026-03-30 08:00"));
+}
+
 TEST(StartTimes, AllStartsOfASeriesThatTheClockJumpsOverBecomeOne) {
     EXPECT_THAT(NextLocal(Series(0, 15, 2359), "Europe/Berlin", "2026-03-29 00:30:00", 4),
                 ElementsAre("2026-03-29 01:45", "2026-03-29 03:00", "2026-03-29 03:15",

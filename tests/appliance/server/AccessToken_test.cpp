@@ -48,6 +48,26 @@ TEST_F(AccessTokenTest, IsMadeAtTheFirstStart) {
     EXPECT_TRUE(token->Matches(content.substr(0, 64)));
 }
 
+TEST_F(AccessTokenTest, IsNotMadeWhereItIsOnlyRead) {
+    std::string error;
+    EXPECT_FALSE(AccessToken::Load(File(), error).has_value());
+    EXPECT_EQ(error, "cannot use the token file " + File() + ": No such file or directory");
+    EXPECT_FALSE(std::filesystem::exists(File()));
+    Write(kDigits);
+    EXPECT_TRUE(AccessToken::Load(File(), error).has_value());
+}
+
+TEST_F(AccessTokenTest, SignsWhatOnlyItsHolderCanSign) {
+    std::string error;
+    Write(kDigits);
+    const auto token = AccessToken::Load(File(), error);
+    const std::string signature = orva::ToHex(token->Sign("text"));
+    EXPECT_EQ(orva::ToHex(token->Sign("text")), signature);
+    EXPECT_NE(orva::ToHex(token->Sign("texT")), signature);
+    Write(std::string(64, '0'));
+    EXPECT_NE(orva::ToHex(AccessToken::Load(File(), error)->Sign("text")), signature);
+}
+
 TEST_F(AccessTokenTest, IsReadableForItsOwnerOnlyWhateverTheUmask) {
     const mode_t before = ::umask(0);
     std::string error;

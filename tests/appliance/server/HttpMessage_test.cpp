@@ -1,6 +1,8 @@
 #include "appliance/server/HttpMessage.h"
 
+#include <arpa/inet.h>
 #include <gtest/gtest.h>
+#include <netinet/in.h>
 
 #include <string>
 
@@ -56,6 +58,33 @@ TEST(HttpMessage, FindsHeaderFieldsInAnyCase) {
     EXPECT_EQ(request.CountHeaders("CONTENT-TYPE"), 2U);
     EXPECT_EQ(request.Header("Host"), std::nullopt);
     EXPECT_EQ(request.CountHeaders("Host"), 0U);
+}
+
+TEST(HttpMessage, TrimsBlanks) {
+    EXPECT_EQ(orva::TrimBlanks(" \ta b\t "), "a b");
+    EXPECT_EQ(orva::TrimBlanks(" \t"), "");
+    EXPECT_EQ(orva::TrimBlanks(""), "");
+}
+
+std::string PeerText(const char* ipv6) {
+    sockaddr_in6 address{};
+    address.sin6_family = AF_INET6;
+    EXPECT_EQ(::inet_pton(AF_INET6, ipv6, &address.sin6_addr), 1);
+    return orva::ToText(orva::ToPeerAddress(reinterpret_cast<const sockaddr*>(&address)).value());
+}
+
+TEST(HttpMessage, NamesWhereARequestComesFrom) {
+    sockaddr_in ipv4{};
+    ipv4.sin_family = AF_INET;
+    ::inet_pton(AF_INET, "192.0.2.7", &ipv4.sin_addr);
+    EXPECT_EQ(orva::ToText(*orva::ToPeerAddress(reinterpret_cast<const sockaddr*>(&ipv4))),
+              "192.0.2.7");
+    EXPECT_EQ(PeerText("::ffff:192.0.2.7"), "192.0.2.7");
+    EXPECT_EQ(PeerText("2001:db8:1:2:3:4:5:6"), "2001:db8:1:2::");
+    sockaddr other{};
+    other.sa_family = AF_UNIX;
+    EXPECT_FALSE(orva::ToPeerAddress(&other).has_value());
+    EXPECT_FALSE(orva::ToPeerAddress(nullptr).has_value());
 }
 
 TEST(HttpMessage, ComparesTextsWithoutRegardToCase) {

@@ -1,10 +1,12 @@
 // A server on a free port with a handler that a test can watch, hold and release.
 #pragma once
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 
 #include <condition_variable>
 #include <cstdio>
+#include <filesystem>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -22,7 +24,7 @@ inline HttpResponse Text(int status, const std::string& body) {
 }
 
 // Answers what it was asked. "/refused" is not admitted, "/throw" throws, "/hold" waits for
-// Release().
+// Release(), "/small" takes four bytes of body.
 class EchoHandler : public HttpHandler {
   public:
     std::optional<HttpResponse> Admit(const HttpRequest& request) override {
@@ -42,6 +44,15 @@ class EchoHandler : public HttpHandler {
             changed.notify_all();
             changed.wait(lock, [this] { return released; });
         }
+        if (request.path == "/peer") {
+            return Text(200, request.peer ? ToText(*request.peer) : "none");
+        }
+        if (request.path == "/file") {
+            HttpResponse response = Text(request.Query("status") == "304" ? 304 : 200, "");
+            response.file = FileDescriptor(::open(file.c_str(), O_RDONLY | O_CLOEXEC));
+            response.fileSize = std::filesystem::file_size(file);
+            return response;
+        }
         if (request.path == "/large") {
             return Text(200, std::string(std::size_t{8} << 20U, 'x'));
         }
@@ -50,6 +61,10 @@ class EchoHandler : public HttpHandler {
                              std::string(request.Header("X-Test").value_or("-")) + " " +
                              std::to_string(request.body.size()) + ":" +
                              request.body.substr(0, 20));
+    }
+
+    std::size_t LargestBody(const HttpRequest& request) const override {
+        return request.path == "/small" ? 4 : HttpHandler::LargestBody(request);
     }
 
     HttpResponse Refuse(int status, const std::string& reason) override {
@@ -66,6 +81,9 @@ class EchoHandler : public HttpHandler {
         released = true;
         changed.notify_all();
     }
+
+    // What is sent for "/file".
+    std::string file;
 
   private:
     std::mutex mutex;

@@ -52,6 +52,48 @@ TEST_F(HttpServerTest, AnswersAHeadRequestWithoutABody) {
     EXPECT_EQ(connection.Receive().value().body, "GET /2 - - 0:");
 }
 
+TEST_F(HttpServerTest, SendsAFile) {
+    Start();
+    const Sandbox sandbox;
+    std::string content;
+    for (int i = 0; i < 300'000; ++i) {
+        content += std::to_string(i);
+    }
+    handler.file = sandbox.Write("file", content);
+    HttpConnection connection = Connect();
+    connection.Send(Get("/file"));
+    EXPECT_EQ(connection.Receive().value().body, content);
+    connection.Send("HEAD /file HTTP/1.1\r\nHost: x\r\n\r\n");
+    EXPECT_EQ(connection.Receive(true).value().headers.at("content-length"),
+              std::to_string(content.size()));
+    connection.Send(Get("/file?status=304"));
+    const std::optional<HttpAnswer> unchanged = connection.Receive(true);
+    EXPECT_EQ(unchanged->status, 304);
+    EXPECT_EQ(unchanged->headers.at("content-length"), std::to_string(content.size()));
+    connection.Send(Get("/file"));
+    EXPECT_EQ(connection.Receive().value().body, content);
+}
+
+TEST_F(HttpServerTest, KnowsWhereARequestComesFrom) {
+    Start();
+    EXPECT_EQ(Ask(Get("/peer")).body, "127.0.0.1");
+}
+
+TEST_F(HttpServerTest, TakesNoLargerBodyThanTheHandlerDoes) {
+    Start();
+    EXPECT_EQ(Ask(Post("/small", "1234")).status, 200);
+    HttpConnection connection = Connect();
+    connection.Send(Post("/small", "12345") + Get("/next"));
+    const std::optional<HttpAnswer> refused = connection.Receive();
+    EXPECT_EQ(refused->status, 413);
+    EXPECT_EQ(refused->body, "the body is larger than 4 bytes");
+    EXPECT_EQ(connection.Receive().value().body, "GET /next - - 0:");
+    EXPECT_EQ(Ask("POST /small HTTP/1.1\r\nHost: x\r\nTransfer-Encoding: chunked\r\n\r\n" +
+                  Chunk("123") + Chunk("45") + "0\r\n\r\n")
+                  .status,
+              413);
+}
+
 TEST_F(HttpServerTest, ReadsAChunkedBody) {
     Start();
     const HttpAnswer answer = Ask(kChunkedPost + Chunk("hello ") + Chunk("world") + "0\r\n\r\n");

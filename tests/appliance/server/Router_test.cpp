@@ -7,14 +7,16 @@
 #include <string>
 
 #include "appliance/root/Root.h"
+#include "tests/appliance/server/Requests.h"
 #include "tests/system/Process.h"
 
 namespace {
 
 using orva::HttpRequest;
 using orva::HttpResponse;
-
-constexpr char kToken[] = "0123456789abcdef0123456789abcdef0123456789abcdef0123456789abcdef";
+using orva::test::ErrorBody;
+using orva::test::HeaderOf;
+using orva::test::kToken;
 
 void Echo(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     Json::Value answer = request->GetParam("", Json::Value());
@@ -33,7 +35,8 @@ class RouterTest : public testing::Test {
         token = orva::AccessToken::LoadOrCreate(file, error);
         std::filesystem::create_directories(sandbox.Path() / "usr/orva/orvaman/webman/texts/de");
         orva::SetRoot(sandbox.Path().string());
-        router = std::make_unique<orva::Router>(dispatcher, *token);
+        authenticator = std::make_unique<orva::Authenticator>(*token, false);
+        router = std::make_unique<orva::Router>(dispatcher, *authenticator, page);
     }
 
     // What a good client sends to `target`.
@@ -47,7 +50,7 @@ class RouterTest : public testing::Test {
 
     HttpResponse Ask(HttpRequest request, const std::string& body = {}) const {
         if (std::optional<HttpResponse> refusal = router->Admit(request)) {
-            return *refusal;
+            return *std::move(refusal);
         }
         request.body = body;
         return router->Serve(request);
@@ -58,22 +61,10 @@ class RouterTest : public testing::Test {
     orva::ApiCatalogue catalogue;
     orva::Dispatcher dispatcher{catalogue};
     std::optional<orva::AccessToken> token;
+    std::unique_ptr<orva::Authenticator> authenticator;
+    const orva::PageFiles page{(sandbox.Path() / "page").string()};
     std::unique_ptr<orva::Router> router;
 };
-
-std::string HeaderOf(const HttpResponse& response, const std::string& name) {
-    for (const auto& [field, value] : response.headers) {
-        if (field == name) {
-            return value;
-        }
-    }
-    return "(none)";
-}
-
-std::string ErrorBody(int code, const std::string& message) {
-    return R"({"success":false,"error":{"code":)" + std::to_string(code) +
-           R"(,"details":{"msg":")" + message + R"("}}})";
-}
 
 TEST_F(RouterTest, CallsAMethod) {
     const HttpResponse response = Ask(Good("POST", "/webapi/Test.Echo/1/echo"), R"({"a":1})");
@@ -112,6 +103,55 @@ TEST_F(RouterTest, KnowsNoOtherPlaces) {
         EXPECT_EQ(response.status, 404) << target;
         EXPECT_EQ(response.body, ErrorBody(107, "there is nothing at this place")) << target;
     }
+}
+
+TEST_F(RouterTest, SaysThatThereIsNoPage) {
+    for (const char* method : {"GET", "HEAD"}) {
+        const HttpResponse response = Ask(Good(method, "/"));
+        EXPECT_EQ(response.status, 404);
+        EXPECT_EQ(HeaderOf(response, "Content-Type"), "text/plain; charset=utf-8");
+        EXPECT_EQ(response.body,
+                  "The browser page is not installed here. The web API is at /webapi.\n");
+    }
+    EXPECT_EQ(Ask(Good("GET", "/index.html")).body,
+              ErrorBody(107, "there is nothing at this place"));
+}
+
+TEST_F(RouterTest, ShowsThePageToEverybody) {
+    sandbox.Write("page/index.html", "<!doctype html>");
+    const HttpResponse response = Ask(orva::test::MakeRequest("GET", "/"));
+    EXPECT_EQ(response.status, 200);
+    EXPECT_EQ(response.fileSize, 15U);
+    const HttpResponse posted = Ask(Good("POST", "/index.html"));
+    EXPECT_EQ(posted.status, 405);
+    EXPECT_EQ(HeaderOf(posted, "Allow"), "GET, HEAD");
+}
+
+TEST_F(RouterTest, ShowsNoPageInThePlaceOfTheApi) {
+    sandbox.Write("page/webapi/Test.Echo/1/echo.html", "page");
+    sandbox.Write("page/session", "page");
+    EXPECT_EQ(Ask(orva::test::MakeRequest("GET", "/webapi/Test.Echo/1/echo.html")).status, 405);
+    EXPECT_EQ(Ask(orva::test::MakeRequest("GET", "/session")).body,
+              R"({"success":true,"data":{"signed_in":false}})");
+}
+
+TEST_F(RouterTest, SignsABrowserIn) {
+    HttpRequest request =
+        orva::test::MakeRequest("POST", "/session", {{"Content-Type", "application/json"}});
+    const HttpResponse response = Ask(request, R"({"token":")" + std::string(kToken) + R"("})");
+    EXPECT_EQ(response.status, 200);
+    const std::string cookie = HeaderOf(response, "Set-Cookie").substr(0, 77);
+    request = Good("POST", "/webapi/Test.Echo/1/echo");
+    request.headers[0] = {"Cookie", cookie};
+    EXPECT_EQ(Ask(request, "{}").status, 403);
+    request.headers.emplace_back("Host", "nas:5080");
+    request.headers.emplace_back("Origin", "http://nas:5080");
+    EXPECT_EQ(Ask(request, "{}").body, R"({"success":true,"data":{"language":"en"}})");
+}
+
+TEST_F(RouterTest, TakesLittleFromThoseWhoAreStillToSignIn) {
+    EXPECT_EQ(router->LargestBody(orva::test::MakeRequest("POST", "/session")), 4096U);
+    EXPECT_GT(router->LargestBody(Good("POST", "/webapi/Test.Echo/1/echo")), std::size_t{1} << 20U);
 }
 
 TEST_F(RouterTest, SaysWhichHttpMethodsAPlaceAllows) {

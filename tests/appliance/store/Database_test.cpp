@@ -6,13 +6,18 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <filesystem>
 #include <fstream>
+#include <memory>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "appliance/root/Root.h"
+#include "appliance/store/DatabaseFile.h"
 #include "appliance/store/StoreFailure.h"
+#include "appliance/store/TaskTable.h"
 #include "platform/qlibc.h"
 #include "tests/appliance/store/StoreTest.h"
 
@@ -48,6 +53,28 @@ class DatabaseTest : public StoreTest {
         const std::vector<std::string> log = TakeLog();
         failed.log = log.size() == 1 ? log[0] : std::to_string(log.size()) + " log lines";
         return failed;
+    }
+
+    // Whether nobody sets the database up or waits for his turn to write.
+    bool CanLockDirectory() const {
+        try {
+            return orva::LockDatabaseDirectory(DatabasePath(), std::chrono::milliseconds(0))
+                .IsOpen();
+        } catch (const orva::StoreFailure&) {
+            return false;
+        }
+    }
+
+    template <class Condition>
+    static bool BecomesTrue(Condition condition) {
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+        while (!condition()) {
+            if (std::chrono::steady_clock::now() > deadline) {
+                return false;
+            }
+            std::this_thread::yield();
+        }
+        return true;
     }
 
     // Both kinds of use fail in the same way, and the file keeps its bytes.
@@ -172,6 +199,55 @@ TEST_F(DatabaseTest, ADatabaseLockedForLongerThanThePatienceIsBusyAndWorksAgainA
         EXPECT_EQ(Count(), 1U);
     }
     EXPECT_EQ(TaskStore::Current()->Save(SampleTask("b")), 2);
+}
+
+TEST_F(DatabaseTest, WhoWaitsToWriteIsTheNextWhateverTheOtherProcessDoes) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    orva::Database& mine = TaskStore::Current()->UsedDatabase();
+    const std::unique_ptr<TaskStore> other = OtherProcess();
+    for (int round = 0; round < 20; ++round) {
+        const std::string name = "other " + std::to_string(round);
+        std::jthread waiting;
+        {
+            orva::WriteTransaction first(mine);
+            waiting = std::jthread([&other, &name] { other->Save(SampleTask(name)); });
+            // The one that waits has the right to be the next from now on.
+            ASSERT_TRUE(BecomesTrue([this] { return !CanLockDirectory(); }));
+            first.Commit();
+        }
+        {
+            orva::WriteTransaction second(mine);
+            EXPECT_EQ(orva::ReadTask(*second, round + 2)->name, name);
+        }
+        waiting.join();
+    }
+}
+
+TEST_F(DatabaseTest, AQueueThatDoesNotMoveForLongerThanThePatienceIsBusyAndWorksAgainAfterwards) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    Reopen(std::chrono::milliseconds(30));
+    Count();
+    {
+        const orva::FileDescriptor lock =
+            orva::LockDatabaseDirectory(DatabasePath(), std::chrono::milliseconds(0));
+        const Failed failed = Saving();
+        EXPECT_EQ(failed.code, orva::kErrDatabaseBusy);
+        EXPECT_THAT(failed.log, HasSubstr("changes by other processes take too long"));
+        EXPECT_EQ(Count(), 1U);
+    }
+    EXPECT_EQ(TaskStore::Current()->Save(SampleTask("b")), 2);
+}
+
+TEST_F(DatabaseTest, WhoGaveUpWaitingKeepsNobodyElseFromWriting) {
+    TaskStore::Current()->Save(SampleTask("a"));
+    Reopen(std::chrono::milliseconds(30));
+    {
+        SQLite::Database holder(DatabasePath(), SQLite::OPEN_READWRITE);
+        holder.exec("BEGIN IMMEDIATE");
+        EXPECT_EQ(Saving().code, orva::kErrDatabaseBusy);
+        EXPECT_TRUE(CanLockDirectory());
+    }
+    EXPECT_EQ(OtherProcess()->Save(SampleTask("b")), 2);
 }
 
 TEST_F(DatabaseTest, ADatabaseThatIsRemovedWhileInUseStartsEmpty) {

@@ -12,7 +12,6 @@ namespace {
 
 using orva::TaskData;
 using testing::ElementsAre;
-using testing::IsEmpty;
 using ListRecord = _tag_orva_sched_task_;
 
 class SchedTaskListsTest : public StoreTest {

@@ -285,9 +285,10 @@ TEST_F(TaskStoreTest, ARunIsQueuedOnlyWhileASchedulerIsAlive) {
     store.QueueRun(1);
     EXPECT_EQ(CodeOf([&] { store.QueueRun(2); }), orva::kErrNotAllowed);
     EXPECT_EQ(Stored("SELECT group_concat(task || ' ' || reason || ' ' || state || ' ' || "
-                     "datetime(queued_at, 'unixepoch'), ', ') FROM run"),
+                     "datetime(queued_at / 1000, 'unixepoch'), ', ') FROM run"),
               "1 hand queued 2026-05-01 12:00:00, 1 hand queued 2026-05-01 12:00:00");
     EXPECT_EQ(Stored("SELECT asked_program FROM run"), program_invocation_short_name);
+    EXPECT_EQ(Stored("SELECT task_name FROM run"), "a");
 }
 
 TEST_F(TaskStoreTest, ARemovedTaskTakesItsQueuedRunsAlong) {
@@ -302,6 +303,22 @@ TEST_F(TaskStoreTest, ARemovedTaskTakesItsQueuedRunsAlong) {
     }
     store.Remove(1);
     EXPECT_EQ(Stored("SELECT group_concat(state) FROM run"), "ended");
+}
+
+TEST_F(TaskStoreTest, ARunThatChangesLeavesTheSnapshotOfTheTasksAsItIs) {
+    TaskStore& store = *TaskStore::Current();
+    store.Save(SampleTask("a"));
+    const auto before = store.CurrentSnapshot();
+    SQLite::Database(DatabasePath(), SQLite::OPEN_READWRITE)
+        .exec(
+            "INSERT INTO run (task, reason, state, queued_at, asked_program, asked_account) "
+            "VALUES (1, 'hand', 'queued', 0, '', '')");
+    EXPECT_EQ(store.CurrentSnapshot(), before);
+    OtherProcess()->Save(SampleTask("b"));
+    EXPECT_THAT(Ids(*store.CurrentSnapshot()), ElementsAre(1, 2));
+    // 06:30 of the next day has passed: its start is another one now.
+    SetNow("2026-05-02 12:00:00");
+    EXPECT_EQ(Start(1), "2026-05-03 06:30");
 }
 
 TEST_F(TaskStoreTest, AStartOfTheScheduleCanBeRecordedOnlyOnce) {

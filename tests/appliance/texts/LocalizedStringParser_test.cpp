@@ -44,7 +44,7 @@ TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectForADamagedFileAndLogsItOnce
     Write(kFile, "{");
     EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
-                                       ": Line 1, Column 2 Missing '}' or object member name"));
+                                       ": line 1, column 2: missing '}' or object member name"));
 }
 
 TEST_F(LocalizedStringParserTest, ServesTheRestOfAFileWithAFaultAndLogsItOnceAVersion) {

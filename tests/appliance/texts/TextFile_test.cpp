@@ -16,6 +16,36 @@ TEST(TextFileTest, ReadsSectionsOfTexts) {
     EXPECT_EQ(error, "");
 }
 
+TEST(TextFileTest, CopiesStayWhenTheDocumentIsGone) {
+    std::string error;
+    Json::Value copy;
+    {
+        const Json::Value texts =
+            orva::ParseTextFile(R"({"common": {"run": "Run", "stop": "Stop"}})", error);
+        copy = texts;
+    }
+    const Json::Value next =
+        orva::ParseTextFile(R"({"common": {"run": "Los", "stop": "Stop"}})", error);
+    EXPECT_EQ(copy["common"]["run"], "Run");
+    EXPECT_EQ(next["common"]["run"], "Los");
+    copy["common"]["run"] = "mine";
+    EXPECT_EQ(next["common"]["run"], "Los");
+}
+
+TEST(TextFileTest, ReadsMoreTextsThanItKeepsForGood) {
+    constexpr std::size_t kLength = 1 << 20;
+    for (char letter = 'a'; letter <= 'm'; ++letter) {
+        const std::string text(kLength, letter);
+        const std::string name = std::string("name ") + letter;
+        std::string error;
+        const Json::Value texts =
+            orva::ParseTextFile("{\"s\": {\"" + name + "\": \"" + text + "\"}}", error);
+        const Json::Value copy = texts;
+        ASSERT_EQ(copy["s"][name].asString(), text);
+        EXPECT_EQ(error, "");
+    }
+}
+
 TEST(TextFileTest, LeavesOutOnlyWhatIsNoTextAndNamesTheFirst) {
     const auto parse = [](const char* content, std::string& error) {
         error.clear();

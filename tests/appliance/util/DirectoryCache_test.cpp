@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 
 #include <cerrno>
+#include <chrono>
 #include <filesystem>
 
 #include "tests/appliance/util/Sandbox.h"
@@ -46,6 +47,37 @@ TEST_F(DirectoryCacheTest, TellsDirectoriesApart) {
     MakeDirectory("/e/b");
     EXPECT_THAT(*cache.Get(RootPath() + "/d"), ElementsAre("a"));
     EXPECT_THAT(*cache.Get(RootPath() + "/e"), ElementsAre("b"));
+}
+
+TEST_F(DirectoryCacheTest, SeesThatALinkNoLongerLeadsToAFolder) {
+    MakeDirectory("/d/a");
+    MakeDirectory("/target");
+    std::filesystem::create_symlink(RootPath() + "/target", RootPath() + "/d/b");
+    // Nothing in /d itself changes from here on. Only a settled list is remembered.
+    orva::FileIdentity identity;
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+    do {
+        ASSERT_EQ(orva::GetFileIdentity(RootPath() + "/d", identity), 0);
+        ASSERT_LT(std::chrono::steady_clock::now(), deadline);
+    } while (!identity.IsSettled());
+    EXPECT_THAT(*cache.Get(RootPath() + "/d"), ElementsAre("a", "b"));
+    std::filesystem::remove(RootPath() + "/target");
+    EXPECT_THAT(*cache.Get(RootPath() + "/d"), ElementsAre("a"));
+    MakeDirectory("/target");
+    EXPECT_THAT(*cache.Get(RootPath() + "/d"), ElementsAre("a", "b"));
+}
+
+TEST_F(DirectoryCacheTest, TellsWhyADirectoryCouldNotBeRead) {
+    int error = -1;
+    EXPECT_THAT(*cache.Get(RootPath() + "/none", error), IsEmpty());
+    EXPECT_EQ(error, ENOENT);
+    Write("/file", "");
+    EXPECT_THAT(*cache.Get(RootPath() + "/file", error), IsEmpty());
+    EXPECT_EQ(error, ENOTDIR);
+    TakeLog();
+    MakeDirectory("/d/a");
+    EXPECT_THAT(*cache.Get(RootPath() + "/d", error), ElementsAre("a"));
+    EXPECT_EQ(error, 0);
 }
 
 TEST_F(DirectoryCacheTest, IsEmptyWithoutTheDirectory) {

@@ -11,6 +11,7 @@
 #include <thread>
 
 #include "appliance/util/AtomicFile.h"
+#include "appliance/util/FileDescriptor.h"
 #include "tests/appliance/util/Sandbox.h"
 
 namespace {
@@ -208,6 +209,21 @@ TEST_F(FileCacheTest, CountsNoBytesForFilesThatAreGoneOrForgotten) {
     const auto b = cache.Get(Path("b"));
     EXPECT_EQ(cache.Get(Path("a")), a);
     EXPECT_EQ(cache.Get(Path("b")), b);
+}
+
+TEST_F(FileCacheTest, FindsAFileFromAnOpenFolderToo) {
+    Write("/folder/a", "one");
+    const orva::FileDescriptor folder(
+        ::open(Path("folder").c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    ASSERT_TRUE(folder.IsOpen());
+    const auto first = cache.Get(Path("folder/a"), folder.Get(), "a");
+    EXPECT_EQ(*first, "ONE");
+    EXPECT_EQ(*cache.Get(Path("folder/a")), "ONE");
+    EXPECT_EQ(cache.Size(), 1U);
+    Write("/folder/a", "two");
+    EXPECT_EQ(*cache.Get(Path("folder/a"), folder.Get(), "a"), "TWO");
+    std::filesystem::remove(Path("folder/a"));
+    EXPECT_EQ(cache.Get(Path("folder/a"), folder.Get(), "a"), nullptr);
 }
 
 TEST_F(FileCacheTest, ParsesAFileOnceForManyThreads) {

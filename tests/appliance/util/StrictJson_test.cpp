@@ -186,7 +186,12 @@ TEST(StrictJsonTest, RefusesADocumentOfAHundredThousandLevels) {
 TEST(StrictJsonTest, SaysWhereTheFaultIs) {
     EXPECT_EQ(ErrorOf("{\n  \"a\": 01\n}"), "line 2, column 9: a malformed number");
     EXPECT_EQ(ErrorOf("[1, x]"), "line 1, column 5: an unexpected character");
-    EXPECT_NE(ErrorOf("{\"a\" 1}").find("Line 1"), std::string::npos);
+    EXPECT_EQ(ErrorOf("{\"a\" 1}"), "line 1, column 6: missing ':' after object member name");
+    EXPECT_EQ(ErrorOf("{\"a\":}"),
+              "line 1, column 6: syntax error: value, object or array expected");
+    EXPECT_EQ(ErrorOf(""), "line 1, column 1: syntax error: value, object or array expected");
+    EXPECT_EQ(ErrorOf("{\"a\":1,\"a\":2}"), "line 1, column 8: duplicate key: 'a'");
+    EXPECT_EQ(ErrorOf("1 2"), "line 1, column 3: extra non-whitespace after JSON value");
 }
 
 TEST(StrictJsonTest, NeverReadsBeyondATextWithoutAZero) {

@@ -75,6 +75,13 @@ TEST_F(ModuleLoaderTest, PassesOverFilesThatAreNoModulesByName) {
     EXPECT_EQ(log, "");
 }
 
+TEST_F(ModuleLoaderTest, PassesOverThePlatformOfAnotherAppliance) {
+    sandbox.Write("liborva.so", "another version");
+    Install("echo", "echo.so");
+    EXPECT_TRUE(HasMethod(Load(), "Test.Echo", 1, "echo"));
+    EXPECT_EQ(log, "");
+}
+
 TEST_F(ModuleLoaderTest, PassesOverThePlatformsOwnLibrary) {
     Dl_info info{};
     ASSERT_NE(::dladdr(reinterpret_cast<const void*>(&orva::MakeErrorAnswer), &info), 0);

@@ -1,0 +1,24 @@
+#pragma once
+
+#include <absl/time/time.h>
+
+#include <optional>
+
+#include "appliance/schedule/Schedule.h"
+#include "appliance/store/NextStartTime.h"
+
+namespace orva {
+
+// The last starts of a schedule that have come by now.
+struct PassedStarts {
+    StartSecond latest = kUnknownStart;
+    // The one before it.
+    std::optional<StartSecond> before;
+};
+
+// Of the starts from `stored` on, which is one itself and not later than `now`. The effort grows
+// with the logarithm of the time that has passed, not with the number of starts.
+PassedStarts FindPassedStarts(const Schedule& schedule, const absl::TimeZone& zone,
+                              StartSecond stored, absl::Time now);
+
+}  // namespace orva

@@ -1,0 +1,140 @@
+#pragma once
+
+#include <absl/time/time.h>
+
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <map>
+#include <memory>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "appliance/runs/RunWriter.h"
+#include "appliance/scheduler/ClockTrust.h"
+#include "appliance/scheduler/Planner.h"
+#include "appliance/scheduler/RunHost.h"
+#include "appliance/store/TaskStore.h"
+
+namespace orva {
+
+// Carries out what the planner decides, on the task store and a host of runs. Knows neither an
+// event loop nor a clock of its own: who drives it calls Work() when something may have changed,
+// and again when Work() has said so.
+//
+// Every step is one transaction, and what has to survive is committed before the host is told of
+// it: however the program ends, the next one finds in the store and at the host how far it got.
+//
+// Functions throw StoreFailure when the store fails; nothing is lost then, and the step is done
+// again at the next call. Belongs to one thread.
+class Scheduler {
+  public:
+    struct Options {
+        // How many runs may go on at once.
+        std::size_t mostRuns = 64;
+        // When this program was made: no right clock stands before that.
+        absl::Time programMade = absl::InfinitePast();
+        // How long the machine has been running.
+        std::function<absl::Duration()> uptime = [] { return absl::InfiniteDuration(); };
+        // Whether the kernel has its time from a time service.
+        std::function<bool()> clockSynchronised = [] { return false; };
+    };
+
+    // All three must outlive the scheduler.
+    Scheduler(TaskStore& taskStore, RunHost& runHost, Options schedulerOptions);
+
+    // Takes over what an earlier scheduler has left. Comes before anything else, until it has
+    // succeeded once.
+    void Recover();
+
+    // Does a part of what there is to do. Yields when to be called again at the latest: a time that
+    // has passed when there is more to do at once.
+    absl::Time Work();
+
+    // A run of the host has ended. Throws nothing.
+    void RunEnded(std::int64_t run);
+    // Somebody has set the clock. Throws nothing.
+    void ClockWasSet();
+    // Throws nothing.
+    void SetMostRuns(std::size_t mostRuns) { options.mostRuns = mostRuns; }
+
+    // Ends a run. Nothing when that is under way, else why it cannot be.
+    std::optional<std::string> Stop(std::int64_t run);
+
+    // Removes some of the runs that are too old to be kept. True as long as there may be more.
+    bool RemoveOldRuns();
+
+    std::size_t RunsGoingOn() const { return running.size(); }
+
+  private:
+    struct RunningTask {
+        int task = 0;
+        std::string app;
+    };
+    struct EndedRun {
+        std::int64_t run = 0;
+        // What is said of it when nobody knows how it ended.
+        std::string_view whyLost;
+    };
+    struct Beginning {
+        RunOrder order;
+        std::string app;
+    };
+    // What one transaction does, for what is to follow its commit.
+    struct Step {
+        // So many of the first ended runs are stored.
+        std::size_t endings = 0;
+        std::vector<Beginning> beginnings;
+        // The tasks that have runs going on after it.
+        RunningTasks tasks;
+    };
+
+    absl::Time Now() const { return store.Now(); }
+    Moment CurrentMoment();
+    void TakeOver(Connection& connection, const RunningRun& run);
+    void ResumeQueue(Connection& connection, const Moment& moment);
+    bool HasWork(const Moment& moment);
+    void DoWork(const Moment& moment);
+    void StoreEndings(Connection& connection, const Moment& moment, Step& step);
+    bool RecordDueTasks(Connection& connection, const Moment& moment);
+    void ReadQueue(Connection& connection);
+    void StartQueued(Connection& connection, const Moment& moment, Step& step);
+    std::optional<int> CorrectStarts(Connection& connection, const Moment& moment) const;
+    void Begin(const Beginning& beginning);
+    void ForgetQueue();
+    bool Corrects(const Moment& moment) const;
+    bool CanStart() const;
+    absl::Time NextCall(const Moment& moment);
+
+    TaskStore& store;
+    RunHost& host;
+    Options options;
+    ClockTrust clock;
+
+    // Runs that wait, in the order in which they are to start: a copy of what the store holds.
+    std::set<std::pair<absl::Time, std::int64_t>> queue;
+    std::int64_t lastQueued = 0;
+    std::map<std::int64_t, RunningTask> running;
+    RunningTasks runningTasks;
+    // Runs that have ended and whose rows still say that they go on.
+    std::deque<EndedRun> ended;
+    // Why runs could not be begun, until that is stored.
+    std::map<std::int64_t, RunEnding> failedStarts;
+
+    // The next starts of tasks up to this id hold for the zone and the clock as they are; nothing
+    // when all do.
+    std::optional<int> corrected = 0;
+    absl::TimeZone zoneOfStarts;
+    bool clockTrusted = true;
+    bool moreDue = false;
+    // Up to which task old runs have been removed.
+    int trimmedTask = 0;
+};
+
+}  // namespace orva

@@ -1,0 +1,281 @@
+#include "appliance/supervisor/Supervisor.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <sys/ioctl.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <string_view>
+
+#include "appliance/supervisor/CommandStart.h"
+#include "appliance/supervisor/OutputFile.h"
+#include "appliance/supervisor/Owner.h"
+#include "appliance/supervisor/RunFiles.h"
+#include "appliance/supervisor/RunRecords.h"
+
+namespace orva {
+namespace {
+
+// A command that prints a lot is not kept waiting for each 64 KiB. Where the machine allows less,
+// it stays as it is.
+constexpr int kPipeSize = 256 * 1024;
+constexpr mode_t kEndingMode = 0640;
+
+bool WriteAll(int file, std::string_view content) {
+    while (!content.empty()) {
+        const ssize_t written = ::write(file, content.data(), content.size());
+        if (written < 0 && errno == EINTR) {
+            continue;
+        }
+        if (written <= 0) {
+            return false;
+        }
+        content.remove_prefix(static_cast<std::size_t>(written));
+    }
+    return true;
+}
+
+std::optional<RunOrder> ReadOrder(const std::string& folder) {
+    const FileDescriptor file(::open((folder + kOrderFile).c_str(), O_RDONLY | O_CLOEXEC));
+    std::string records;
+    std::array<char, 4096> buffer{};
+    ssize_t got = 0;
+    while (file.IsOpen() && (got = ::read(file.Get(), buffer.data(), buffer.size())) > 0) {
+        records.append(buffer.data(), static_cast<std::size_t>(got));
+    }
+    return OrderFromRecords(records);
+}
+
+bool SyncFolder(const std::string& path) {
+    const FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    return folder.IsOpen() && ::fsync(folder.Get()) == 0;
+}
+
+// Puts the ending into the space that was kept for it, then gives that its name: it is seen whole
+// or not at all, after a power cut too.
+bool WriteEnding(const std::string& folder, const RunEnding& ending) {
+    const std::string reserve = folder + kEndingReserve;
+    const std::string records = ToRecords(ending);
+    const FileDescriptor file(
+        ::open(reserve.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kEndingMode));
+    return file.IsOpen() && WriteAll(file.Get(), records) &&
+           ::ftruncate(file.Get(), static_cast<off_t>(records.size())) == 0 &&
+           ::fsync(file.Get()) == 0 &&
+           ::rename(reserve.c_str(), (folder + kEndingFile).c_str()) == 0 && SyncFolder(folder) &&
+           SyncFolder(folder + "/..");
+}
+
+// By errno.
+std::string CannotKeepOutput() {
+    return errno == ENOSPC || errno == EDQUOT
+               ? "no space for output"
+               : std::string("cannot keep output: ") + std::strerror(errno);
+}
+
+// What setpriv has to say, as the end of a sentence.
+std::string FirstLineOf(const std::string& output) {
+    const std::optional<StoredOutput> stored = ReadOutput(output);
+    const std::string line = stored ? stored->head.substr(0, stored->head.find('\n')) : "";
+    return line.empty() ? line : ": " + line;
+}
+
+void IgnoreRequestsToEnd() {
+    for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGQUIT, SIGPIPE}) {
+        ::signal(signal, SIG_IGN);
+    }
+}
+
+bool SayWhoWeAre() {
+    const pid_t self = ::getpid();
+    const RunProcess process{BootId(), self, ProcessStart(self).value_or(0), 0};
+    return WriteAll(kSupervisorLock, SupervisorRecords(process));
+}
+
+// The command's standard output and error.
+class OutputPipe {
+  public:
+    bool Open() {
+        int ends[2];
+        if (::pipe2(ends, O_CLOEXEC) != 0) {
+            return false;
+        }
+        reading = FileDescriptor(ends[0]);
+        writing = FileDescriptor(ends[1]);
+        ::fcntl(reading.Get(), F_SETFL, O_NONBLOCK);
+        static_cast<void>(::fcntl(reading.Get(), F_SETPIPE_SZ, kPipeSize));
+        return true;
+    }
+    int WritingEnd() const { return writing.Get(); }
+    void CloseWritingEnd() { writing = FileDescriptor(); }
+
+    // Keeps what is printed until the process behind `watch` has ended, and what it had printed by
+    // then.
+    void KeepUntilEnd(OutputWriter& output, int watch) {
+        std::array<pollfd, 2> watched = {pollfd{watch, POLLIN, 0},
+                                         pollfd{reading.Get(), POLLIN, 0}};
+        for (;;) {
+            if (::poll(watched.data(), watched.size(), -1) < 0) {
+                continue;
+            }
+            if (watched[0].revents != 0) {
+                break;
+            }
+            if (Take(output, buffer.size()) == 0) {
+                // Nobody has it open any more.
+                watched[1].fd = -1;
+            }
+        }
+        // What others print from now on is not the command's: the pipe may never become empty.
+        int left = 0;
+        if (::ioctl(reading.Get(), FIONREAD, &left) != 0) {
+            return;
+        }
+        while (left > 0) {
+            const ssize_t got = Take(output, static_cast<std::size_t>(left));
+            if (got <= 0) {
+                return;
+            }
+            left -= static_cast<int>(got);
+        }
+    }
+
+    // Lets a process of its own throw away what is still printed, if there is anybody who could.
+    void LeaveToOthers() {
+        // Before there could be a second process that has it.
+        ::close(kSupervisorLock);
+        pollfd state{reading.Get(), POLLIN, 0};
+        if ((::poll(&state, 1, 0) == 1 && (state.revents & POLLHUP) != 0) || ::fork() != 0) {
+            return;
+        }
+        // Everything else is let go of, such as the space of files that will be removed.
+        ::fcntl(reading.Get(), F_SETFL, 0);
+        ::dup2(reading.Get(), STDIN_FILENO);
+        ::close_range(STDIN_FILENO + 1, ~0U, 0);
+        while (::read(STDIN_FILENO, buffer.data(), buffer.size()) > 0) {
+        }
+        ::_exit(EXIT_SUCCESS);
+    }
+
+  private:
+    // What read() says of one read of at most `limit` bytes.
+    ssize_t Take(OutputWriter& output, std::size_t limit) {
+        const ssize_t got = ::read(reading.Get(), buffer.data(), std::min(limit, buffer.size()));
+        if (got > 0) {
+            output.Append({buffer.data(), static_cast<std::size_t>(got)});
+        }
+        return got;
+    }
+
+    FileDescriptor reading;
+    FileDescriptor writing;
+    std::array<char, std::size_t{64} * 1024> buffer{};
+};
+
+// One run, from its order to its ending.
+class SupervisedRun {
+  public:
+    explicit SupervisedRun(std::string runFolder) : folder(std::move(runFolder)) {}
+
+    RunEnding Run() {
+        RunEnding ending;
+        if (!Start(ending)) {
+            ending.ended = RunTimeNow();
+            return ending;
+        }
+        std::string why;
+        const bool shellRuns = command->WaitForShell(why);
+        ending.started = RunTimeNow();
+        pipe.KeepUntilEnd(*output, command->Watch());
+        ending.ended = RunTimeNow();
+
+        // Not reaped yet: as long as the ending is not written, the command's id must not become
+        // another process's.
+        siginfo_t info{};
+        while (::waitid(P_PID, static_cast<id_t>(command->Id()), &info, WEXITED | WNOWAIT) != 0 &&
+               errno == EINTR) {
+        }
+        if (info.si_code != CLD_EXITED) {
+            ending.signal = info.si_status;
+        } else if (shellRuns) {
+            ending.exitStatus = info.si_status;
+        } else {
+            ending.started.reset();
+            ending.why = why + FirstLineOf(folder + kOutputFile);
+        }
+        static_cast<void>(output->Sync());
+        return ending;
+    }
+
+    // Once the ending is written.
+    void Finish() {
+        if (command) {
+            ::waitpid(command->Id(), nullptr, 0);
+            pipe.LeaveToOthers();
+        }
+    }
+
+  private:
+    // False with the ending's `why` set.
+    bool Start(RunEnding& ending) {
+        // Who finds an empty process file and no ending takes the run for one that has not begun.
+        if (!SayWhoWeAre()) {
+            ending.why = CannotKeepOutput();
+            return false;
+        }
+        const std::optional<RunOrder> order = ReadOrder(folder);
+        if (!order) {
+            ending.why = "its order cannot be read";
+            return false;
+        }
+        const std::optional<Owner> owner = FindOwner(order->owner, ending.why);
+        if (!owner) {
+            return false;
+        }
+        output = OutputWriter::Create(folder + kOutputFile);
+        if (!output || !pipe.Open()) {
+            ending.why = CannotKeepOutput();
+            return false;
+        }
+        command = StartedCommand::Start(*owner, order->command,
+                                        CleanEnvironment(*owner, order->environment),
+                                        pipe.WritingEnd(), ending.why);
+        pipe.CloseWritingEnd();
+        if (!command) {
+            return false;
+        }
+        if (!WriteAll(kSupervisorLock, CommandRecord(command->Id()))) {
+            syslog(LOG_WARNING, "cannot write the process file: %s", std::strerror(errno));
+        }
+        return true;
+    }
+
+    const std::string folder;
+    OutputPipe pipe;
+    std::optional<OutputWriter> output;
+    std::optional<StartedCommand> command;
+};
+
+}  // namespace
+
+bool Supervise(const std::string& folder) {
+    IgnoreRequestsToEnd();
+    ::fcntl(kSupervisorLock, F_SETFD, FD_CLOEXEC);
+    SupervisedRun run(folder);
+    const bool written = WriteEnding(folder, run.Run());
+    if (!written) {
+        syslog(LOG_ERR, "cannot write the ending of %s: %s", folder.c_str(), std::strerror(errno));
+    }
+    run.Finish();
+    return written;
+}
+
+}  // namespace orva

@@ -1,0 +1,247 @@
+#include "include/PlainJson.h"
+
+#include <cstddef>
+#include <cstring>
+#include <string>
+#include <utility>
+
+namespace {
+
+constexpr int kMostLevels = 32;
+constexpr int kMostDigits = 9;
+
+bool IsDigit(char byte) { return byte >= '0' && byte <= '9'; }
+
+int HexDigit(char byte) {
+    if (IsDigit(byte)) {
+        return byte - '0';
+    }
+    if (byte >= 'a' && byte <= 'f') {
+        return byte - 'a' + 10;
+    }
+    return byte >= 'A' && byte <= 'F' ? byte - 'A' + 10 : -1;
+}
+
+void AppendUtf8(std::string& text, unsigned codePoint) {
+    const auto append = [&text](unsigned byte) { text += static_cast<char>(byte); };
+    if (codePoint < 0x80) {
+        append(codePoint);
+    } else if (codePoint < 0x800) {
+        append(0xC0 | (codePoint >> 6));
+        append(0x80 | (codePoint & 0x3F));
+    } else {
+        append(0xE0 | (codePoint >> 12));
+        append(0x80 | ((codePoint >> 6) & 0x3F));
+        append(0x80 | (codePoint & 0x3F));
+    }
+}
+
+// Each function reads one piece at the current place; false when it is not plain.
+class PlainReader {
+  public:
+    PlainReader(std::string_view text, std::span<const Json::StaticString> frequentNames)
+        : at(text.data()), end(text.data() + text.size()), frequent(frequentNames) {}
+
+    bool Document(Json::Value& value) {
+        SkipBlanks();
+        if (at == end || (*at != '{' && *at != '[') || !Value(value, 0)) {
+            return false;
+        }
+        SkipBlanks();
+        return at == end;
+    }
+
+  private:
+    void SkipBlanks() {
+        while (at != end && (*at == ' ' || *at == '\n' || *at == '\t' || *at == '\r')) {
+            ++at;
+        }
+    }
+
+    // The next byte after blanks; NUL at the end, which is plain nowhere.
+    char Next() {
+        SkipBlanks();
+        return at != end ? *at : '\0';
+    }
+
+    bool Take(char byte) {
+        if (Next() != byte) {
+            return false;
+        }
+        ++at;
+        return true;
+    }
+
+    bool Word(std::string_view word, Json::Value& value, Json::Value meaning) {
+        if (std::string_view(at, static_cast<std::size_t>(end - at)).substr(0, word.size()) !=
+            word) {
+            return false;
+        }
+        at += word.size();
+        value = std::move(meaning);
+        return true;
+    }
+
+    bool Value(Json::Value& value, int level) {
+        switch (Next()) {
+            case '{':
+                return Object(value, level + 1);
+            case '[':
+                return Array(value, level + 1);
+            case '"': {
+                std::string_view text;
+                if (!Text(text)) {
+                    return false;
+                }
+                value = Json::Value(text.data(), text.data() + text.size());
+                return true;
+            }
+            case 't':
+                return Word("true", value, true);
+            case 'f':
+                return Word("false", value, false);
+            case 'n':
+                return Word("null", value, Json::Value());
+            default:
+                return Integer(value);
+        }
+    }
+
+    bool Object(Json::Value& value, int level) {
+        ++at;
+        value = Json::Value(Json::objectValue);
+        if (level > kMostLevels) {
+            return false;
+        }
+        if (Take('}')) {
+            return true;
+        }
+        do {
+            std::string_view name;
+            if (Next() != '"' || !Text(name) || name.empty()) {
+                return false;
+            }
+            Json::Value& member = Member(value, name);
+            if (!Take(':') || !Value(member, level)) {
+                return false;
+            }
+        } while (Take(','));
+        return Take('}');
+    }
+
+    Json::Value& Member(Json::Value& object, std::string_view name) {
+        for (const Json::StaticString& each : frequent) {
+            if (name == each.c_str()) {
+                return object[each];
+            }
+        }
+        return *object.demand(name.data(), name.data() + name.size());
+    }
+
+    bool Array(Json::Value& value, int level) {
+        ++at;
+        value = Json::Value(Json::arrayValue);
+        if (level > kMostLevels) {
+            return false;
+        }
+        if (Take(']')) {
+            return true;
+        }
+        do {
+            if (!Value(value.append(Json::Value()), level)) {
+                return false;
+            }
+        } while (Take(','));
+        return Take(']');
+    }
+
+    bool Integer(Json::Value& value) {
+        const bool negative = at != end && *at == '-';
+        const char* digit = negative ? at + 1 : at;
+        const char* const first = digit;
+        int number = 0;
+        while (digit != end && IsDigit(*digit) && digit - first < kMostDigits) {
+            number = number * 10 + (*digit++ - '0');
+        }
+        constexpr std::string_view kAfter = ",]} \n\t\r";
+        if (digit == first || digit == end || kAfter.find(*digit) == std::string_view::npos) {
+            return false;
+        }
+        at = digit;
+        value = negative ? -number : number;
+        return true;
+    }
+
+    // `text` is good until the next call.
+    bool Text(std::string_view& text) {
+        const char* const first = ++at;
+        while (at != end && *at != '"' && *at != '\\') {
+            ++at;
+        }
+        if (at != end && *at == '"') {
+            text = {first, static_cast<std::size_t>(at++ - first)};
+            return true;
+        }
+        unescaped.assign(first, at);
+        while (at != end && *at != '"') {
+            if (*at != '\\') {
+                unescaped += *at++;
+            } else if (++at == end || !Escape()) {
+                return false;
+            }
+        }
+        text = unescaped;
+        return at++ != end;
+    }
+
+    bool Escape() {
+        constexpr std::string_view kEscapes = "\"\\/bfnrt";
+        constexpr std::string_view kMeanings = "\"\\/\b\f\n\r\t";
+        if (*at == 'u') {
+            ++at;
+            return CodeUnit();
+        }
+        const std::size_t which = kEscapes.find(*at++);
+        if (which == std::string_view::npos) {
+            return false;
+        }
+        unescaped += kMeanings[which];
+        return true;
+    }
+
+    bool CodeUnit() {
+        if (end - at < 4) {
+            return false;
+        }
+        unsigned unit = 0;
+        for (int i = 0; i < 4; ++i) {
+            const int digit = HexDigit(*at++);
+            if (digit < 0) {
+                return false;
+            }
+            unit = unit * 16 + static_cast<unsigned>(digit);
+        }
+        if (unit >= 0xD800 && unit <= 0xDFFF) {
+            return false;
+        }
+        AppendUtf8(unescaped, unit);
+        return true;
+    }
+
+    const char* at;
+    const char* const end;
+    const std::span<const Json::StaticString> frequent;
+    std::string unescaped;
+};
+
+}  // namespace
+
+bool ReadPlainJson(std::string_view text, std::span<const Json::StaticString> frequentNames,
+                   Json::Value& value) {
+    Json::Value read;
+    if (!PlainReader(text, frequentNames).Document(read)) {
+        return false;
+    }
+    value = std::move(read);
+    return true;
+}
