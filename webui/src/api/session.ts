@@ -1,0 +1,34 @@
+import { errorOf, jsonRequest, readAnswer, send } from './client';
+
+/** What a person, or the sign-in link, shows to be let in. */
+export type Credential = { token: string } | { code: string };
+
+export type SignInResult = 'ok' | 'refused' | 'too-many';
+
+export async function signIn(credential: Credential): Promise<SignInResult> {
+    const response = await send('session', jsonRequest('POST', credential));
+    if (response.status === 401) {
+        return 'refused';
+    }
+    if (response.status === 429) {
+        return 'too-many';
+    }
+    const answer = await readAnswer(response);
+    if (!answer.success) {
+        throw errorOf(answer, response.status);
+    }
+    return 'ok';
+}
+
+export async function isSignedIn(): Promise<boolean> {
+    const response = await send('session', { method: 'GET' });
+    const body = (await response.json()) as {
+        signed_in?: boolean;
+        data?: { signed_in?: boolean };
+    };
+    return (body.signed_in ?? body.data?.signed_in) === true;
+}
+
+export async function signOut(): Promise<void> {
+    await send('session', { method: 'DELETE', headers: { 'Content-Type': 'application/json' } });
+}

@@ -1,0 +1,94 @@
+import { useCallback, useEffect, useState } from 'react';
+
+import { onSignedOut } from '../api/client';
+import { isSignedIn, signIn, signOut } from '../api/session';
+import { live } from '../live/live';
+import { useTexts } from '../texts/TextsProvider';
+import { errorText } from '../ui/errorText';
+import { replace, SIGN_IN_LINK } from './route';
+
+export type SessionState = 'checking' | 'out' | 'in' | 'over';
+
+export interface Session {
+    state: SessionState;
+    /** Why the sign-in is shown, when there is something to say. */
+    notice: string;
+    entered(): void;
+    leave(): void;
+}
+
+/** The one-time code of a sign-in link; it leaves the address bar and the history at once. */
+function takeCode(): string | null {
+    const code = SIGN_IN_LINK.exec(window.location.hash)?.[1] ?? null;
+    if (code !== null) {
+        replace('#/tasks');
+    }
+    return code;
+}
+
+const linkCode = takeCode();
+
+async function enterWithLink(): Promise<boolean> {
+    return linkCode !== null && (await signIn({ code: decodeURIComponent(linkCode) })) === 'ok';
+}
+
+export function useSession(): Session {
+    const { t } = useTexts();
+    const [state, setState] = useState<SessionState>('checking');
+    const [notice, setNotice] = useState('');
+
+    const entered = useCallback(() => {
+        setNotice('');
+        void live.start().then(() => {
+            live.refresh();
+            setState('in');
+        });
+    }, []);
+
+    useEffect(() => {
+        let current = true;
+        const begin = async () => {
+            const byLink = await enterWithLink();
+            const inside = byLink || (await isSignedIn());
+            if (!current) {
+                return;
+            }
+            if (inside) {
+                entered();
+                return;
+            }
+            setNotice(linkCode === null ? '' : 'signin.linkUsed');
+            setState('out');
+        };
+        begin().catch((error: unknown) => {
+            if (current) {
+                setNotice(errorText(error, t));
+                setState('out');
+            }
+        });
+        return () => {
+            current = false;
+        };
+        // Once: a change of language does not sign in again.
+        // eslint-disable-next-line react-hooks/exhaustive-deps
+    }, []);
+
+    // Views stay as they are under the dialog: nothing that was typed is lost.
+    useEffect(() => onSignedOut(() => setState((old) => (old === 'in' ? 'over' : old))), []);
+
+    const leave = useCallback(() => {
+        live.stop();
+        void signOut().finally(() => {
+            setNotice('');
+            setState('out');
+        });
+    }, []);
+
+    return {
+        state,
+        notice: notice === 'signin.linkUsed' ? t('signin.linkUsed') : notice,
+        entered,
+        leave,
+    };
+}
+

@@ -1,0 +1,57 @@
+import type { Run } from '../api/history';
+import { useTexts } from '../texts/TextsProvider';
+import { outcomeOf, resultText, runLength } from './result';
+
+const HEIGHT = 60;
+const BAR = 10;
+const STEP = 14;
+const LEAST = 3;
+
+/** The runs that stand below, from old to new: how long each took, and how it went. */
+export function RunChart({ runs }: { runs: Run[] }) {
+    const { t, format } = useTexts();
+    const shown = runs.toReversed().map((run) => ({ run, length: runLength(run, Date.now()) ?? 0 }));
+    const longest = Math.max(1, ...shown.map(({ length }) => length));
+    const good = runs.filter((run) => outcomeOf(run) === 'ok').length;
+    const bad = runs.filter((run) => outcomeOf(run) === 'failed').length;
+    const summary = t('chart.summary', {
+        good: t.count('chart.good', good),
+        bad: t.count('chart.bad', bad),
+        longest: format.length(longest),
+    });
+    return (
+        <figure className="orva-chart">
+            <svg
+                viewBox={`0 0 ${shown.length * STEP} ${HEIGHT}`}
+                width={shown.length * STEP}
+                height={HEIGHT}
+                role="img"
+                aria-label={summary}
+            >
+                {shown.map(({ run, length }, index) => {
+                    const height = Math.max(LEAST, Math.round((length / longest) * HEIGHT));
+                    return (
+                        <rect
+                            key={run.run}
+                            className={`orva-bar-${outcomeOf(run)}`}
+                            x={index * STEP}
+                            y={HEIGHT - height}
+                            width={BAR}
+                            height={height}
+                            rx={1}
+                        >
+                            <title>
+                                {[
+                                    format.instant(run.started ?? run.queued),
+                                    resultText(run, t),
+                                    format.length(length),
+                                ].join(' · ')}
+                            </title>
+                        </rect>
+                    );
+                })}
+            </svg>
+            <figcaption className="orva-subtle">{summary}</figcaption>
+        </figure>
+    );
+}

@@ -1,0 +1,96 @@
+import { useEffect, useState } from 'react';
+
+import { type Run, runOutput } from '../api/history';
+import { PERIOD, useLive } from '../live/live';
+import { useQuery } from '../live/useQuery';
+import { useTexts } from '../texts/TextsProvider';
+import { errorText } from '../ui/errorText';
+import { Loading } from '../ui/states';
+import { Notice } from '../ui/Notice';
+
+/** Counts up every two seconds while `active` and the page is seen. */
+function useBeat(active: boolean): number {
+    const [beat, setBeat] = useState(0);
+    useEffect(() => {
+        if (!active) {
+            return;
+        }
+        const timer = setInterval(() => {
+            if (!document.hidden) {
+                setBeat((old) => old + 1);
+            }
+        }, PERIOD);
+        return () => clearInterval(timer);
+    }, [active]);
+    return beat;
+}
+
+function Text({ text, label }: { text: string; label: string }) {
+    return (
+        <pre className="orva-output" tabIndex={0} aria-label={label} role="region">
+            {text}
+        </pre>
+    );
+}
+
+/** Facts about a run that the row has no room for, and what it printed: live while it runs. */
+export function RunDetails({ run }: { run: Run }) {
+    const { t, format } = useTexts();
+    const { online } = useLive();
+    const running = run.state === 'running';
+    const beat = useBeat(running && online);
+    const { data, error } = useQuery(`${run.run} ${run.state} ${beat}`, (signal) =>
+        runOutput(run.run, signal),
+    );
+    return (
+        <div className="orva-details">
+            <dl className="orva-facts">
+                <dt>{t('history.run')}</dt>
+                <dd>{run.run}</dd>
+                {run.occurrence && (
+                    <>
+                        <dt>{t('history.occurrence')}</dt>
+                        <dd>{format.instant(run.occurrence)}</dd>
+                    </>
+                )}
+                {run.reason === 'hand' && (run.asked_account || run.asked_program) && (
+                    <>
+                        <dt>{t('history.askedBy')}</dt>
+                        <dd>{[run.asked_account, run.asked_program].filter(Boolean).join(' · ')}</dd>
+                    </>
+                )}
+                {run.ended && (
+                    <>
+                        <dt>{t('history.ended')}</dt>
+                        <dd>{format.instant(run.ended)}</dd>
+                    </>
+                )}
+            </dl>
+            {error && !data && (
+                <Notice isPlain variant="danger" title={errorText(error, t)} />
+            )}
+            {!data && !error && <Loading />}
+            {data && data.size === 0 && (
+                <p>{t(running ? 'history.noOutputYet' : 'history.noOutput')}</p>
+            )}
+            {data && data.size > 0 && (
+                <>
+                    <p className="orva-subtle">
+                        {t('history.printed', { bytes: format.bytes(data.size) })}
+                    </p>
+                    {data.dropped > 0 ? (
+                        <>
+                            <Text text={data.head} label={t('history.head')} />
+                            <p className="orva-dropped">
+                                {t('history.dropped', { bytes: format.bytes(data.dropped) })}
+                            </p>
+                            <Text text={data.tail} label={t('history.tail')} />
+                        </>
+                    ) : (
+                        <Text text={data.head + data.tail} label={t('history.output')} />
+                    )}
+                </>
+            )}
+        </div>
+    );
+}

@@ -1,0 +1,112 @@
+import { Button } from '@patternfly/react-core';
+import { ExpandableRowContent, Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
+import AngleDownIcon from '@patternfly/react-icons/dist/esm/icons/angle-down-icon';
+import AngleRightIcon from '@patternfly/react-icons/dist/esm/icons/angle-right-icon';
+import { useState } from 'react';
+
+import type { Run } from '../api/history';
+import { useNow } from '../live/useNow';
+import { useTexts } from '../texts/TextsProvider';
+import { ResultLabel, runLength, whyText } from './result';
+import { RunDetails } from './RunDetails';
+import { StopRun } from './StopRun';
+
+interface Props {
+    runs: Run[];
+    /** Whether all runs are of one task, whose name then stands above. */
+    oneTask: boolean;
+    open: number | null;
+    onOpen(run: number | null): void;
+    onTask(task: number): void;
+}
+
+function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
+    const { run, oneTask, open, onOpen, onTask, onStop } = props;
+    const { t, format } = useTexts();
+    const isOpen = open === run.run;
+    const running = run.state === 'running';
+    const now = useNow(running);
+    const length = runLength(run, now);
+    const why = run.why ? whyText(run.why, t) : '';
+    return (
+        <Tbody isExpanded={isOpen}>
+            <Tr>
+                <Td className="pf-v6-c-table__toggle">
+                    <Button
+                        variant="plain"
+                        aria-expanded={isOpen}
+                        aria-label={t('history.outputOf', { run: run.run })}
+                        icon={isOpen ? <AngleDownIcon /> : <AngleRightIcon />}
+                        onClick={() => onOpen(isOpen ? null : run.run)}
+                    />
+                </Td>
+                <Td dataLabel={t('history.result')}>
+                    <ResultLabel run={run} />
+                    {why && <div className="orva-subtle">{why}</div>}
+                </Td>
+                {!oneTask && (
+                    <Td dataLabel={t('history.task')} modifier="breakWord">
+                        <Button variant="link" isInline onClick={() => onTask(run.task)}>
+                            {run.name}
+                        </Button>
+                    </Td>
+                )}
+                <Td dataLabel={t('history.start')}>
+                    {format.instant(run.started ?? run.occurrence ?? run.queued)}
+                </Td>
+                <Td dataLabel={t('history.length')}>
+                    {length === null ? '–' : format.length(length)}
+                </Td>
+                <Td dataLabel={t('history.reason')}>{t(`reason.${run.reason}`)}</Td>
+                <Td isActionCell>
+                    {running && (
+                        <Button
+                            variant="secondary"
+                            size="sm"
+                            onClick={onStop}
+                            aria-label={t('history.stopOf', { name: run.name })}
+                        >
+                            {t('action.stop')}
+                        </Button>
+                    )}
+                </Td>
+            </Tr>
+            <Tr isExpanded={isOpen}>
+                <Td colSpan={oneTask ? 6 : 7}>
+                    <ExpandableRowContent>{isOpen && <RunDetails run={run} />}</ExpandableRowContent>
+                </Td>
+            </Tr>
+        </Tbody>
+    );
+}
+
+export function RunTable(props: Props) {
+    const { t } = useTexts();
+    const [stopping, setStopping] = useState<Run | null>(null);
+    return (
+        <>
+            <Table aria-label={t('history.title')} variant="compact" gridBreakPoint="grid-md">
+                <Thead>
+                    <Tr>
+                        <Th screenReaderText={t('history.output')} />
+                        <Th>{t('history.result')}</Th>
+                        {!props.oneTask && <Th>{t('history.task')}</Th>}
+                        <Th>{t('history.start')}</Th>
+                        <Th>{t('history.length')}</Th>
+                        <Th>{t('history.reason')}</Th>
+                        <Th screenReaderText={t('list.actionsColumn')} />
+                    </Tr>
+                </Thead>
+                {props.runs.map((run) => (
+                    <RunRow
+                        key={run.run}
+                        {...props}
+                        run={run}
+                        onStop={() => setStopping(run)}
+                    />
+                ))}
+            </Table>
+            {stopping && <StopRun run={stopping} onClose={() => setStopping(null)} />}
+        </>
+    );
+}

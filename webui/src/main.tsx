@@ -1,0 +1,18 @@
+import './styles.css';
+
+import { StrictMode } from 'react';
+import { createRoot } from 'react-dom/client';
+
+import { App } from './app/App';
+import { applyStoredTheme } from './app/theme';
+
+applyStoredTheme();
+
+const root = document.getElementById('root');
+if (root) {
+    createRoot(root).render(
+        <StrictMode>
+            <App />
+        </StrictMode>,
+    );
+}

@@ -1,0 +1,108 @@
+import { expect, openNew, rowOf, tab, test } from './support/test';
+
+test('what is missing is told at its field, and the first one gets the focus', async ({ app }) => {
+    await openNew(app, 'Recycle bins');
+    await tab(app, 'Settings');
+    await app.getByLabel('Only these shares').check();
+    await app.getByLabel('By size').check();
+    await app.getByLabel('Each bin may hold').fill('4096');
+    await tab(app, 'Schedule');
+    await app.getByRole('button', { name: 'Mon', exact: true }).click();
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(app.getByText('Enter a name.')).toBeVisible();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toBeFocused();
+    await expect(app.getByRole('tab', { name: 'Settings' })).toContainText('needs a correction');
+
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Bins');
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(app.getByText('Choose at least one share.')).toBeVisible();
+    await expect(app.getByText('Enter a whole number from 1 to 4095.')).toBeVisible();
+    await app.getByLabel('media').check();
+    await app.getByLabel('Each bin may hold').fill('4095');
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(rowOf(app, 'Bins')).toContainText('Empty recycle bins: "media"');
+});
+
+test('a refusal of the appliance stands where it belongs, and nothing typed is lost', async ({
+    app,
+    appliance,
+}) => {
+    await openNew(app, 'Script');
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Refused');
+    await tab(app, 'Settings');
+    await app.getByLabel('Commands').fill('echo kept');
+    // The appliance itself refuses: the owner has gone between choosing and saving.
+    await app.route('**/create*', async (route) => {
+        const body = JSON.parse(route.request().postData() ?? '{}') as object;
+        await route.continue({ postData: JSON.stringify({ ...body, owner: 'nobody-at-all' }) });
+    });
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(app.getByRole('tab', { name: 'General' })).toHaveAttribute(
+        'aria-selected',
+        'true',
+    );
+    await expect(app.getByText('Invalid (basic) object (code 117)')).toBeVisible();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Refused');
+    await app.unroute('**/create*');
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(rowOf(app, 'Refused')).toBeVisible();
+    const { data } = await appliance.call('get', { id: 9 });
+    expect(data).toMatchObject({ extra: { script: 'echo kept' } });
+});
+
+test('a task that another client deletes while it is edited cannot be saved', async ({
+    app,
+    appliance,
+}) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Too late');
+    await appliance.call('delete', { task: 1 });
+    await expect(app.getByText('Somebody deleted this task meanwhile.')).toBeVisible();
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(app.getByText('The task could not be saved')).toBeVisible();
+    await expect(app.getByText('(code 4801)')).toBeVisible();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Too late');
+});
+
+test('the address of a task that does not exist says so', async ({ app }) => {
+    await app.evaluate(() => {
+        window.location.hash = '#/tasks/4711';
+    });
+    await expect(app.getByText('There is no such task, or not any more.')).toBeVisible();
+});
+
+test('a change by another client is told while a task is edited', async ({ app, appliance }) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Mine');
+    const { data } = await appliance.call('get', { id: 1 });
+    await appliance.call('set', { ...data, name: 'Theirs' });
+    await expect(app.getByText('Somebody changed this task meanwhile')).toBeVisible();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Mine');
+    await app.getByRole('button', { name: /Load their version/ }).click();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Theirs');
+    await expect(app.getByText('Somebody changed this task meanwhile')).toHaveCount(0);
+});
+
+test('unsaved work is not left without a question', async ({ app }) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Unsaved');
+    await app.getByRole('link', { name: 'History' }).click();
+    const dialog = app.getByRole('dialog', { name: 'Leave without saving?' });
+    await dialog.getByRole('button', { name: 'Stay' }).click();
+    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Unsaved');
+    await app.getByRole('button', { name: 'Cancel' }).click();
+    await dialog.getByRole('button', { name: 'Leave' }).click();
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+});
+
+test('what may not be edited is disabled with the reason', async ({ app }) => {
+    await app.getByRole('link', { name: 'Back up documents' }).click();
+    await expect(app.getByLabel('Owner')).toBeDisabled();
+    await expect(app.getByText('Only scripts can run as another account.')).toBeVisible();
+    await tab(app, 'Settings');
+    await expect(app.getByText('This task belongs to another application')).toBeVisible();
+    await tab(app, 'Schedule');
+    await app.getByLabel('Time').fill('02:45');
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(rowOf(app, 'Back up documents')).toContainText('2:45 AM');
+});
