@@ -15,7 +15,7 @@ set -euo pipefail
 [ -n "${RECYCLE_BENCH_INSIDE:-}" ] || RECYCLE_BENCH_INSIDE=1 exec unshare --mount "$0" "$@"
 
 readonly PROGRAM=$(realpath "$1") FILES=${2:-1000000} PAIRS=${3:-3} PER_FOLDER=1000
-readonly PLACE=$(mktemp -d "${4:-${TMPDIR:-/tmp}}/recycle_bench.XXXXXX")
+readonly PLACE=$(realpath "$(mktemp -d "${4:-${TMPDIR:-/tmp}}/recycle_bench.XXXXXX")")
 readonly ROOT=$PLACE/root
 readonly BIN=$ROOT/volume1/bench/.recycle
 trap 'cd /; umount -l "$ROOT/volume1" 2>/dev/null || true; rm -rf "$PLACE"' EXIT

@@ -17,7 +17,8 @@ struct _tag_orva_sched_task_;
 
 // A new record that no stored task stands behind (ORVASchedTaskIsNew is true), with the defaults of
 // a new task: listable, enabled, name may be edited, may be run, edited and deleted from the user
-// interface; owned by the account that the program runs as. Null when memory is short. The caller
+// interface; owned by the account that the task store's folder belongs to, or by the one that the
+// program runs as while there is no such folder or account. Null when memory is short. The caller
 // frees it with ORVASchedTaskFree.
 _tag_orva_sched_task_* ORVASchedTaskAlloc();
 
@@ -32,8 +33,8 @@ int ORVASchedTaskLoad(int id, _tag_orva_sched_task_* task);
 // before. Any other changes the stored task with its id in what was changed in the record since it
 // took over that task, and in nothing else: changes that others saved meanwhile stay. Afterwards
 // the record shows the task as it is stored. Fails without a name, an app or an owner (a new record
-// has none when the program's account is not known to this machine), and for a stored task that is
-// gone.
+// has none when the program's account is not known to this machine), with a new command of more
+// than 131071 bytes, and for a stored task that is gone.
 int ORVASchedTaskSave(_tag_orva_sched_task_* task);
 
 // Deletes stored task `id` durably. Fails when there is none.

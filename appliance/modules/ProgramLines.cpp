@@ -28,6 +28,7 @@ constexpr const char* kNowhere = "/dev/null";
 // it. 0 or the errno.
 int Start(const std::vector<std::string>& arguments, int output, pid_t& pid) {
     std::vector<char*> words;
+    words.reserve(arguments.size() + 1);
     for (const std::string& argument : arguments) {
         words.push_back(const_cast<char*>(argument.c_str()));
     }

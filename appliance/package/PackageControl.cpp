@@ -2,16 +2,17 @@
 
 #include <fcntl.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 
 #include <cerrno>
 #include <ctime>
+#include <filesystem>
 #include <system_error>
 #include <utility>
 
 #include "appliance/package/PackageFile.h"
 #include "appliance/root/Root.h"
 #include "appliance/util/Error.h"
-#include "appliance/util/FileDescriptor.h"
 #include "appliance/util/RunCommand.h"
 #include "appliance/util/StopSignals.h"
 
@@ -19,6 +20,12 @@ namespace orva {
 namespace {
 
 constexpr timespec kLookInterval{0, 50'000'000};
+
+// A file for each package, by its id. Not in the package's own folder: whoever may read that could
+// hold its lock.
+constexpr const char* kLocks = "/run/orva/packages";
+constexpr mode_t kLocksMode = 0700;
+constexpr mode_t kLockMode = 0600;
 
 }  // namespace
 
@@ -77,6 +84,35 @@ PackageState PackageControl::WaitFor(PackageState wanted) const {
     }
 }
 
+FileDescriptor PackageControl::TakeTurn(std::string& report) const {
+    const std::string directory = ResolvePath(kLocks);
+    const std::string path = directory + "/" + packageId;
+    std::error_code problem;
+    std::filesystem::create_directories(std::filesystem::path(directory).parent_path(), problem);
+    ::mkdir(directory.c_str(), kLocksMode);
+    // Closed on exec: what the command leaves running must not hold the lock.
+    FileDescriptor lock(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kLockMode));
+    if (!lock.IsOpen()) {
+        report = "cannot be locked: " + path + ": " + std::generic_category().message(errno);
+        return {};
+    }
+    const auto deadline = std::chrono::steady_clock::now() + maxima.turn;
+    while (::flock(lock.Get(), LOCK_EX | LOCK_NB) != 0) {
+        if (errno != EWOULDBLOCK && errno != EINTR) {
+            report = "cannot be locked: " + path + ": " + std::generic_category().message(errno);
+            return {};
+        }
+        if (std::chrono::steady_clock::now() > deadline) {
+            const auto seconds = std::chrono::ceil<std::chrono::seconds>(maxima.turn).count();
+            report = "another start or stop of it did not end within " + std::to_string(seconds) +
+                     (seconds == 1 ? " second" : " seconds");
+            return {};
+        }
+        ::nanosleep(&kLookInterval, nullptr);
+    }
+    return lock;
+}
+
 bool PackageControl::Change(const Verb& verb, std::string& report) const {
     const std::string& line = info.*verb.command;
     if (!info.startable || line.empty()) {
@@ -85,13 +121,9 @@ bool PackageControl::Change(const Verb& verb, std::string& report) const {
                                  : std::string("it is not made to be started and stopped"));
         return false;
     }
-    // Closed on exec: what the command leaves running must not hold the lock.
-    const FileDescriptor lock(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    while (::flock(lock.Get(), LOCK_EX) != 0) {
-        if (errno != EINTR) {
-            report = "cannot be locked: " + std::generic_category().message(errno);
-            return false;
-        }
+    const FileDescriptor lock = TakeTurn(report);
+    if (!lock.IsOpen()) {
+        return false;
     }
     if (State() == verb.wanted) {
         report = verb.already;

@@ -3,6 +3,7 @@
 #include <chrono>
 #include <string>
 
+#include "appliance/util/FileDescriptor.h"
 #include "platform/package.h"
 
 namespace orva {
@@ -28,6 +29,8 @@ class PackageControl {
         std::chrono::milliseconds status{10'000};
         // How long the status may take to show what a start or stop has done.
         std::chrono::milliseconds settling{10'000};
+        // How long to wait for another start or stop of it: that may take all of the above.
+        std::chrono::milliseconds turn{150'000};
     };
 
     explicit PackageControl(std::string id);
@@ -41,7 +44,8 @@ class PackageControl {
 
     // For a loaded one: run its command unless it is in the wanted state already, and wait until
     // its status shows that state, where it gives one. True when that is done; `report` is one line
-    // in either case. Two at once for one package take turns.
+    // in either case. Two at once for one package take turns, by a lock that only the account which
+    // made /run/orva/packages may take: for another account both fail.
     [[nodiscard]] bool Start(std::string& report) const;
     [[nodiscard]] bool Stop(std::string& report) const;
 
@@ -51,6 +55,8 @@ class PackageControl {
     struct Verb;
 
     bool Change(const Verb& verb, std::string& report) const;
+    // Held while it is open; not open with `report` set when it cannot be had.
+    FileDescriptor TakeTurn(std::string& report) const;
     // Its state, looked at until it is the wanted one or cannot be told, or the time is over.
     PackageState WaitFor(PackageState wanted) const;
 

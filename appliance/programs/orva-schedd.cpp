@@ -19,6 +19,7 @@ namespace {
 
 // Another scheduler runs for this root, or what it needs around it cannot be made.
 constexpr int kRefused = 3;
+constexpr int kUsage = 2;
 constexpr const char* kSupervisor = "orva-run";
 // The loop stands still while it waits for another process that holds the database.
 constexpr std::chrono::milliseconds kBusyTimeout{2000};
@@ -84,7 +85,11 @@ int main(int argc, char** argv) {
     app.add_flag("--no-view", withoutView,
                  "Run without a private view of files, where bubblewrap cannot work; /tmp is "
                  "everybody's then, and tasks name a program in it");
-    CLI11_PARSE(app, argc, argv);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        return app.exit(error) == 0 ? EXIT_SUCCESS : kUsage;
+    }
 
     ::openlog("orva-schedd", LOG_PID | LOG_PERROR, LOG_DAEMON);
     if (!root.empty()) {

@@ -27,6 +27,8 @@
 
 namespace {
 
+constexpr int kUsage = 2;
+
 constexpr char kTokenFile[] = "/usr/orva/etc/webapi.token";
 constexpr char kModulesDirectory[] = "/usr/orva/lib";
 constexpr char kPageDirectory[] = "/usr/orva/webui";
@@ -216,7 +218,11 @@ int main(int argc, char** argv) {
                    "Seconds within which a request must have arrived")
         ->check(CLI::Range(1, 3600))
         ->capture_default_str();
-    CLI11_PARSE(app, argc, argv);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        return app.exit(error) == 0 ? EXIT_SUCCESS : kUsage;
+    }
 
     ::openlog("orva-webapid", LOG_PID | LOG_PERROR, LOG_DAEMON);
     if (!arguments.root.empty()) {

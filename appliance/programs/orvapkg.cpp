@@ -50,7 +50,7 @@ int List() {
         orva::PackageControl package(id);
         std::string problem;
         if (!package.Load(problem)) {
-            status = Complain(shown + ": " + problem);
+            status = Complain(std::string(shown).append(": ").append(problem));
             continue;
         }
         const char* const state = package.Info().startable ? WordFor(package.State()) : "-";

@@ -102,7 +102,7 @@ std::vector<Verb> AddHistoryVerbs(CLI::Option_group& verbs, Arguments& arguments
     const CLI::Option* output =
         verbs.add_option("--output", arguments.outputRun, "Show what a run has printed")
             ->type_name("RUN")
-            ->check(CLI::PositiveNumber);
+            ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()));
     return {
         {next,
          [&] {
@@ -198,6 +198,10 @@ int main(int argc, char** argv) {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
         return app.exit(error) == 0 ? orva::kToolDone : orva::kToolUsage;
+    }
+    if (arguments.json && app.count("--next") == 0 && app.count("--history") == 0) {
+        orva::Complain("--json goes with --next and --history only");
+        return orva::kToolUsage;
     }
 
     openlog("orvaschedtool", LOG_PID, LOG_USER);

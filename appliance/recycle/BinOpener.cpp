@@ -4,7 +4,9 @@
 #include <sys/file.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstring>
+#include <thread>
 #include <utility>
 
 #include "appliance/recycle/DirectoryTree.h"
@@ -12,32 +14,52 @@
 namespace orva {
 namespace {
 
+using Clock = std::chrono::steady_clock;
+
+constexpr std::chrono::milliseconds kLockRetry{20};
+
 BinOpening Refuse(const std::string& what, int error) {
     BinOpening refused;
     refused.problem = what + ": " + std::strerror(error);
     return refused;
 }
 
-int Lock(int fd, int operation, const std::function<void()>& waiting) {
-    if (::flock(fd, operation | LOCK_NB) == 0) {
-        return 0;
-    }
-    if (errno == EWOULDBLOCK) {
-        waiting();
-        while (::flock(fd, operation) != 0) {
-            if (errno != EINTR) {
-                return errno;
-            }
+// 0, or the errno: EWOULDBLOCK when others hold it until the deadline.
+int Lock(int fd, int operation, Clock::time_point deadline, const std::function<void()>& waiting) {
+    bool told = false;
+    while (::flock(fd, operation | LOCK_NB) != 0) {
+        if (errno == EINTR) {
+            continue;
         }
-        return 0;
+        if (errno != EWOULDBLOCK) {
+            return errno;
+        }
+        if (!told) {
+            waiting();
+            told = true;
+        }
+        if (Clock::now() >= deadline) {
+            return EWOULDBLOCK;
+        }
+        std::this_thread::sleep_for(kLockRetry);
     }
-    return errno;
+    return 0;
+}
+
+BinOpening Held(std::chrono::milliseconds patience) {
+    const auto seconds = std::chrono::ceil<std::chrono::seconds>(patience).count();
+    BinOpening refused;
+    refused.problem = "another process has held the recycle bin for " + std::to_string(seconds) +
+                      (seconds == 1 ? " second" : " seconds");
+    return refused;
 }
 
 }  // namespace
 
 BinOpening OpenAndLockBin(const std::string& directory, bool preview,
-                          const std::function<void()>& waiting) {
+                          const std::function<void()>& waiting,
+                          std::chrono::milliseconds patience) {
+    const auto deadline = Clock::now() + patience;
     OpenBin opened;
     opened.share = FileDescriptor(OpenDirectoryAt(AT_FDCWD, directory.c_str()));
     if (!opened.share.IsOpen()) {
@@ -60,9 +82,10 @@ BinOpening OpenAndLockBin(const std::string& directory, bool preview,
             refused.noBin = error == ENOENT;
             return refused;
         }
-        const int error = Lock(opened.bin.Get(), preview ? LOCK_SH : LOCK_EX, waiting);
+        const int error = Lock(opened.bin.Get(), preview ? LOCK_SH : LOCK_EX, deadline, waiting);
         if (error != 0) {
-            return Refuse("cannot lock the recycle bin", error);
+            return error == EWOULDBLOCK ? Held(patience)
+                                        : Refuse("cannot lock the recycle bin", error);
         }
         // While we waited the folder may have been replaced; its lock would hold nobody then.
         FileInfo named;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <functional>
 #include <optional>
 #include <string>
@@ -10,6 +11,7 @@
 namespace orva {
 
 inline constexpr const char* kBinFolder = ".recycle";
+inline constexpr std::chrono::milliseconds kBinPatience{60'000};
 
 // A share's bin, open and locked: the kernel holds the lock until `bin` is closed.
 struct OpenBin {
@@ -27,8 +29,10 @@ struct BinOpening {
 
 // Opens the bin of the share whose folder is `directory` (a real path). Neither may be a link. Only
 // one clean works in a bin at a time, previews beside each other: waits until the others are done,
-// after a call of `waiting` when there is something to wait for.
+// after a call of `waiting` when there is something to wait for, but no longer than `patience`:
+// whoever may read the bin can hold its lock.
 BinOpening OpenAndLockBin(const std::string& directory, bool preview,
-                          const std::function<void()>& waiting);
+                          const std::function<void()>& waiting,
+                          std::chrono::milliseconds patience = kBinPatience);
 
 }  // namespace orva

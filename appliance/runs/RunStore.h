@@ -36,7 +36,8 @@ class RunStore {
     // The newest runs first. `offset` and `limit` are not negative.
     Page List(const Filter& filter, std::int64_t offset, std::int64_t limit);
 
-    // The newest run of each of the tasks, in their order; nothing for a task without one.
+    // Of each task that has any, in the order of `tasks`: the run that is going on, otherwise the
+    // newest. A start that was skipped for it would hide it else.
     std::vector<Run> Latest(const std::vector<int>& tasks);
 
     std::optional<Run> Find(std::int64_t run);

@@ -35,7 +35,9 @@ constexpr const char* kSelectOne =
 constexpr const char* kSelectLatest =
     "SELECT id, task, task_name, occurrence, reason, state, why, queued_at, asked_program, "
     "asked_account, started_at, ended_at, exit_status, signal, output_bytes "
-    "FROM run WHERE task = ? ORDER BY id DESC LIMIT 1";
+    "FROM run WHERE id = coalesce("
+    "(SELECT max(id) FROM run INDEXED BY run_in_state WHERE state = 'running' AND task = ?1), "
+    "(SELECT max(id) FROM run WHERE task = ?1))";
 
 std::string BytesOf(SQLite::Statement& row, int column) {
     const SQLite::Column value = row.getColumn(column);

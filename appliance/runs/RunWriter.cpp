@@ -34,10 +34,56 @@ void InsertOutput(Connection& connection, std::int64_t run, const StoredOutput& 
     query->exec();
 }
 
+// False when it is on record already.
+bool RecordStart(Connection& connection, int task, std::int64_t occurrence) {
+    Query query = connection.Prepare(
+        "INSERT INTO recorded_start (task, occurrence) VALUES (?, ?) ON CONFLICT DO NOTHING");
+    query->bind(1, task);
+    query->bind(2, occurrence);
+    return query->exec() > 0;
+}
+
+// Whether the start was skipped: nothing has been started then.
+bool RemoveSkipped(Connection& connection, int task, std::int64_t occurrence) {
+    Query query = connection.Prepare(
+        "DELETE FROM run WHERE task = ? AND occurrence = ? AND state = 'skipped'");
+    query->bind(1, task);
+    query->bind(2, occurrence);
+    return query->exec() > 0;
+}
+
+// The oldest of them, if it is too old: one goes for each one that comes. So a clock that is wrong
+// by years for a while does not wipe out what belongs to the right time.
+void ForgetOldStart(Connection& connection, int task, std::int64_t newest) {
+    std::int64_t oldest = 0;
+    {
+        Query query =
+            connection.Prepare("SELECT min(occurrence) FROM recorded_start WHERE task = ?");
+        query->bind(1, task);
+        query->executeStep();
+        oldest = query->getColumn(0).getInt64();
+    }
+    if (oldest >= newest - absl::ToInt64Seconds(kStartsKnownFor)) {
+        return;
+    }
+    Query query = connection.Prepare(
+        "DELETE FROM recorded_start WHERE task = ?1 AND occurrence = ?2 AND EXISTS "
+        "(SELECT 1 FROM recorded_start WHERE task = ?1 LIMIT 1 OFFSET ?3)");
+    query->bind(1, task);
+    query->bind(2, oldest);
+    query->bind(3, kStartsAlwaysKnown);
+    query->exec();
+}
+
 }  // namespace
 
 std::optional<std::int64_t> InsertRun(Connection& connection, const ScheduledRun& run,
                                       absl::Time now) {
+    if (!RecordStart(connection, run.task, run.occurrence) &&
+        !(run.why.empty() && RemoveSkipped(connection, run.task, run.occurrence))) {
+        return std::nullopt;
+    }
+    ForgetOldStart(connection, run.task, run.occurrence);
     Query query = connection.Prepare(
         "INSERT INTO run (task, task_name, occurrence, reason, state, why, queued_at, "
         "asked_program, asked_account) VALUES (?, ?, ?, ?, ?, ?, ?, '', '') "

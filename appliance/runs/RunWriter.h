@@ -29,8 +29,14 @@ struct ScheduledRun {
     std::string_view why;
 };
 
-// Yields the run's id; nothing when there is a run of that task for that instant already: it has
-// been dealt with, and nothing is stored.
+// For how long it is known of a start by the schedule that it has been put on record, also when its
+// run is no longer kept. Counts back from the task's newest one; so many are known however old.
+inline constexpr absl::Duration kStartsKnownFor = absl::Hours(24 * 90);
+inline constexpr int kStartsAlwaysKnown = 1000;
+
+// Yields the run's id; nothing when that instant of the task is on record already: it has been
+// dealt with, and nothing is stored. A start that was skipped when its time had not really come, by
+// a clock that was wrong, can still be made: its run takes the place of the skipped one.
 std::optional<std::int64_t> InsertRun(Connection& connection, const ScheduledRun& run,
                                       absl::Time now);
 

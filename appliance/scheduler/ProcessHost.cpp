@@ -8,6 +8,9 @@
 #include <time.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
 #include <utility>
 
 #include "appliance/supervisor/RunFolder.h"
@@ -20,15 +23,11 @@ constexpr std::uint64_t kMillisecond = 1000;
 // How often a supervisor is looked for that has not said yet which process it is. It does so within
 // its first milliseconds.
 constexpr std::uint64_t kLookInterval = 20 * kMillisecond;
+// How often a folder is tried again that could not be read.
+constexpr std::uint64_t kReadInterval = 500 * kMillisecond;
 // How often a signal is tried again that a command could not be sent.
 constexpr std::uint64_t kStopInterval = 100 * kMillisecond;
 constexpr std::uint64_t kTimeToStop = 10'000 * kMillisecond;
-
-std::uint64_t MonotonicNow(sd_event* event) {
-    std::uint64_t now = 0;
-    sd_event_now(event, CLOCK_MONOTONIC, &now);
-    return now;
-}
 
 }  // namespace
 
@@ -41,12 +40,16 @@ struct ProcessHost::Watch {
     const RunFolder folder;
     // Of the supervisor, when it is a child of this process; else 0.
     pid_t child = 0;
+    // Whose end is waited for: the supervisor, or the killed shell of one that is gone.
     FileDescriptor process;
     EventSource processSource;
     EventSource lookTimer;
     EventSource stopTimer;
-    // When the command is killed; 0 until it has been asked to end.
+    // When the command is killed; 0 until a stop was asked for.
     std::uint64_t killAt = 0;
+    bool wasAskedToEnd = false;
+    bool wasKilledAbandoned = false;
+    bool saidUnreadable = false;
 };
 
 ProcessHost::ProcessHost(sd_event* eventLoop, std::string supervisorProgram,
@@ -77,19 +80,23 @@ std::optional<std::string> ProcessHost::Start(const RunOrder& order) {
 }
 
 RunHost::Trace ProcessHost::Look(std::int64_t run) {
-    const RunFolder folder(run);
-    if (folder.Ending()) {
-        return Trace::kOver;
+    switch (RunFolder(run).Look()) {
+        case RunFolder::State::kNotBegun:
+            return Trace::kNotBegun;
+        case RunFolder::State::kEnded:
+            return Trace::kOver;
+        case RunFolder::State::kAbandoned:
+            if (!KillAbandoned(Observe(run))) {
+                watches.erase(run);
+                return Trace::kOver;
+            }
+            return Trace::kGoesOn;
+        case RunFolder::State::kSupervised:
+        case RunFolder::State::kUnknown:
+            break;
     }
-    if (folder.IsSupervised()) {
-        LookAgain(Observe(run));
-        return Trace::kGoesOn;
-    }
-    if (folder.Ending()) {
-        return Trace::kOver;
-    }
-    // A supervisor says who it is before it starts the command.
-    return folder.Process() ? Trace::kOver : Trace::kNotBegun;
+    LookAgain(Observe(run));
+    return Trace::kGoesOn;
 }
 
 std::optional<RunEnding> ProcessHost::Ending(std::int64_t run) const {
@@ -109,10 +116,18 @@ void ProcessHost::Remove(std::int64_t run) {
 std::vector<std::int64_t> ProcessHost::All() const { return RunFolder::All(); }
 
 void ProcessHost::Stop(std::int64_t run) {
-    const auto watch = watches.find(run);
-    if (watch != watches.end() && watch->second->killAt == 0) {
-        StopNow(*watch->second);
+    const auto found = watches.find(run);
+    if (found == watches.end() || found->second->killAt != 0) {
+        return;
     }
+    Watch& watch = *found->second;
+    watch.killAt = MonotonicNow() + kTimeToStop;
+    // Before the first signal: a supervisor whose shell that ends must know why.
+    if (!watch.folder.RecordStop(watch.killAt)) {
+        syslog(LOG_ERR, "cannot record the stop of run %lld: %s", static_cast<long long>(run),
+               std::strerror(errno));
+    }
+    ContinueStop(watch);
 }
 
 ProcessHost::Watch& ProcessHost::Observe(std::int64_t run) {
@@ -125,28 +140,29 @@ void ProcessHost::WatchProcess(Watch& watch, FileDescriptor process) {
     sd_event_source* source = nullptr;
     const auto onExit = [](sd_event_source*, int, std::uint32_t, void* context) {
         Watch& over = *static_cast<Watch*>(context);
-        over.host.End(over);
+        over.processSource.reset();
+        over.process = FileDescriptor();
+        over.host.LookAgain(over);
         return 0;
     };
     if (!process.IsOpen() ||
         sd_event_add_io(event, &source, process.Get(), EPOLLIN, onExit, &watch) < 0) {
         // No descriptor left, perhaps.
-        LookLater(watch);
+        LookLater(watch, kLookInterval);
         return;
     }
     watch.process = std::move(process);
     watch.processSource.reset(source);
 }
 
-void ProcessHost::LookLater(Watch& watch) {
+void ProcessHost::LookLater(Watch& watch, std::uint64_t delay) {
     sd_event_source* source = nullptr;
     const auto onTime = [](sd_event_source*, std::uint64_t, void* context) {
         Watch& waiting = *static_cast<Watch*>(context);
         waiting.host.LookAgain(waiting);
         return 0;
     };
-    if (sd_event_add_time_relative(event, &source, CLOCK_MONOTONIC, kLookInterval, 1, onTime,
-                                   &watch) < 0) {
+    if (sd_event_add_time_relative(event, &source, CLOCK_MONOTONIC, delay, 1, onTime, &watch) < 0) {
         syslog(LOG_ERR, "run %lld cannot be watched", static_cast<long long>(watch.run));
         return;
     }
@@ -154,33 +170,75 @@ void ProcessHost::LookLater(Watch& watch) {
 }
 
 void ProcessHost::LookAgain(Watch& watch) {
-    // In this order: between the two the supervisor may have ended.
-    FileDescriptor process = watch.folder.WatchSupervisor();
-    if (process.IsOpen()) {
-        WatchProcess(watch, std::move(process));
-    } else if (watch.folder.IsSupervised()) {
-        LookLater(watch);
-    } else {
-        End(watch);
+    switch (watch.folder.Look()) {
+        case RunFolder::State::kSupervised:
+            if (FileDescriptor process = watch.folder.WatchSupervisor(); process.IsOpen()) {
+                WatchProcess(watch, std::move(process));
+                ResumeStop(watch);
+            } else {
+                LookLater(watch, kLookInterval);
+            }
+            return;
+        case RunFolder::State::kUnknown:
+            if (!std::exchange(watch.saidUnreadable, true)) {
+                syslog(LOG_ERR, "cannot read %s for now: %s", watch.folder.Path().c_str(),
+                       std::strerror(errno));
+            }
+            LookLater(watch, kReadInterval);
+            return;
+        case RunFolder::State::kAbandoned:
+            if (!KillAbandoned(watch)) {
+                End(watch);
+            }
+            return;
+        case RunFolder::State::kNotBegun:
+        case RunFolder::State::kEnded:
+            End(watch);
+            return;
     }
 }
 
-void ProcessHost::StopNow(Watch& watch) {
-    const std::uint64_t now = MonotonicNow(event);
+// False when there is nothing to wait for.
+bool ProcessHost::KillAbandoned(Watch& watch) {
+    if (std::exchange(watch.wasKilledAbandoned, true)) {
+        return false;
+    }
+    FileDescriptor shell = watch.folder.KillAbandonedCommand();
+    if (!shell.IsOpen()) {
+        return false;
+    }
+    syslog(LOG_WARNING, "the supervisor of run %lld is gone; its command was killed",
+           static_cast<long long>(watch.run));
+    WatchProcess(watch, std::move(shell));
+    return true;
+}
+
+// Goes on with a stop that another host was asked for.
+void ProcessHost::ResumeStop(Watch& watch) {
+    if (watch.killAt != 0) {
+        return;
+    }
+    const std::optional<RunProcess> process = watch.folder.Process();
+    if (process && process->killAt != 0) {
+        watch.killAt = process->killAt;
+        ContinueStop(watch);
+    }
+}
+
+void ProcessHost::ContinueStop(Watch& watch) {
+    const std::uint64_t now = MonotonicNow();
     std::uint64_t next = now + kStopInterval;
-    if (watch.killAt == 0) {
-        // Not yet, when the command is only just being started.
-        if (watch.folder.SignalCommand(SIGTERM)) {
-            watch.killAt = now + kTimeToStop;
-            next = watch.killAt;
-        }
-    } else {
+    if (now >= watch.killAt) {
         static_cast<void>(watch.folder.SignalCommand(SIGKILL));
+    } else {
+        // Not yet, when the command is only just being started.
+        watch.wasAskedToEnd = watch.wasAskedToEnd || watch.folder.SignalCommand(SIGTERM);
+        next = watch.wasAskedToEnd ? watch.killAt : std::min(next, watch.killAt);
     }
     sd_event_source* source = nullptr;
     const auto onTime = [](sd_event_source*, std::uint64_t, void* context) {
         Watch& stopping = *static_cast<Watch*>(context);
-        stopping.host.StopNow(stopping);
+        stopping.host.ContinueStop(stopping);
         return 0;
     };
     if (sd_event_add_time(event, &source, CLOCK_MONOTONIC, next, 1, onTime, &watch) >= 0) {

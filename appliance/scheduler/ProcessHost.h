@@ -34,7 +34,8 @@ class ProcessHost final : public RunHost {
     StoredOutput Output(std::int64_t run) const override;
     void Remove(std::int64_t run) override;
     std::vector<std::int64_t> All() const override;
-    // SIGTERM to the command's process group, SIGKILL 10 seconds later.
+    // SIGTERM to the command's process group, SIGKILL 10 seconds later: by this host, or by the one
+    // that finds the run going on then.
     void Stop(std::int64_t run) override;
 
   private:
@@ -42,9 +43,11 @@ class ProcessHost final : public RunHost {
 
     Watch& Observe(std::int64_t run);
     void WatchProcess(Watch& watch, FileDescriptor process);
-    void LookLater(Watch& watch);
+    void LookLater(Watch& watch, std::uint64_t delay);
     void LookAgain(Watch& watch);
-    void StopNow(Watch& watch);
+    bool KillAbandoned(Watch& watch);
+    void ResumeStop(Watch& watch);
+    void ContinueStop(Watch& watch);
     void End(Watch& watch);
 
     sd_event* event;

@@ -24,10 +24,11 @@ class RunHost {
 
     enum class Trace {
         kNotBegun,  // its command was not started and never will be
-        kGoesOn,
-        kOver,  // ended, with its ending or without
+        kGoesOn,    // or nobody can tell now
+        kOver,      // ended, with its ending or without
     };
-    // What a run has come to that another scheduler was to start, in this boot.
+    // What a run has come to that another scheduler was to start, in this boot. One that nobody
+    // cares for any more is over when its command has been killed.
     virtual Trace Look(std::int64_t run) = 0;
 
     // How a run ended; nothing when nobody knows.

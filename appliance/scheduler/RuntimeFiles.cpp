@@ -23,13 +23,32 @@ namespace {
 constexpr std::chrono::milliseconds kLockPatience{1000};
 constexpr std::chrono::milliseconds kLockRetry{5};
 
-constexpr mode_t kLockMode = 0644;
+// Whoever may read the lock can hold it, and keep a scheduler from starting.
+constexpr mode_t kLockMode = 0640;
 constexpr mode_t kSocketMode = 0660;
 
 std::string Reason(const std::string& what) { return what + ": " + std::strerror(errno); }
 
 std::string DirectoryOf(const std::string& file) {
     return std::filesystem::path(file).parent_path().string();
+}
+
+// The group of those who may write the task store; nothing while that has no folder.
+std::optional<gid_t> StoreGroup() {
+    struct stat store {};
+    if (::stat(DirectoryOf(ResolvePath(TaskStore::kDatabaseFile)).c_str(), &store) != 0) {
+        return std::nullopt;
+    }
+    return store.st_gid;
+}
+
+// Also for a file that an earlier scheduler has left with more rights.
+bool GiveLockToStoreGroup(const FileDescriptor& file) {
+    const std::optional<gid_t> group = StoreGroup();
+    if (group && ::fchown(file.Get(), static_cast<uid_t>(-1), *group) != 0 && errno != EPERM) {
+        return false;
+    }
+    return ::fchmod(file.Get(), kLockMode) == 0 || errno == EPERM;
 }
 
 std::string FirstLineOf(const FileDescriptor& file) {
@@ -63,8 +82,7 @@ FileDescriptor LockAsScheduler(std::string& error) {
     }
     std::filesystem::create_directories(directory, problem);
     FileDescriptor file(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kLockMode));
-    // Others ask by this file whether a scheduler is running.
-    if (!file.IsOpen() || (::fchmod(file.Get(), kLockMode) != 0 && errno != EPERM)) {
+    if (!file.IsOpen() || !GiveLockToStoreGroup(file)) {
         error = Reason(path);
         return {};
     }
@@ -101,9 +119,8 @@ std::unique_ptr<ControlSocket> ControlSocket::Open(std::string& error) {
         error = Reason(path);
         return nullptr;
     }
-    struct stat store {};
-    if (::stat(DirectoryOf(ResolvePath(TaskStore::kDatabaseFile)).c_str(), &store) == 0 &&
-        ::chown(path.c_str(), static_cast<uid_t>(-1), store.st_gid) != 0 && errno != EPERM) {
+    const std::optional<gid_t> group = StoreGroup();
+    if (group && ::chown(path.c_str(), static_cast<uid_t>(-1), *group) != 0 && errno != EPERM) {
         error = Reason(path);
         return nullptr;
     }

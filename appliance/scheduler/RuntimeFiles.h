@@ -15,7 +15,8 @@
 namespace orva {
 
 // Takes the lock for as long as the descriptor is open, and makes its directory when that is
-// missing. Not open with `error` set when another scheduler holds it, or when it cannot be made.
+// missing. Those who may write the task store's directory may ask by it whether a scheduler is
+// running. Not open with `error` set when another scheduler holds it, or when it cannot be made.
 [[nodiscard]] FileDescriptor LockAsScheduler(std::string& error);
 
 // The scheduler's end of SchedulerLink. Does not block.

@@ -1,5 +1,7 @@
 #include "appliance/scheduler/Scheduler.h"
 
+#include <syslog.h>
+
 #include <algorithm>
 #include <limits>
 #include <string_view>
@@ -23,6 +25,7 @@ constexpr int kTrimmedRunsAtOnce = 20;
 
 constexpr std::string_view kWhyRestarted = "the machine was restarted";
 constexpr std::string_view kWhyNoTrace = "its supervisor has left no ending";
+constexpr const char* kWhyDamaged = "its task is damaged";
 
 RunTime RunTimeOf(absl::Time time) {
     return RunTime(std::chrono::microseconds(absl::ToUnixMicros(time)));
@@ -82,9 +85,10 @@ void Scheduler::TakeOver(Connection& connection, const RunningRun& run) {
         return;
     }
     running.emplace(run.id, RunningTask{run.task, run.app});
-    runningTasks.Add(run.task, run.app);
     if (trace == RunHost::Trace::kOver) {
         ended.push_back({run.id, sameBoot ? kWhyNoTrace : kWhyRestarted});
+    } else {
+        runningTasks.Add(run.task, run.app);
     }
 }
 
@@ -104,7 +108,13 @@ void Scheduler::ResumeQueue(Connection& connection, const Moment& moment) {
     }
 }
 
-void Scheduler::RunEnded(std::int64_t run) { ended.push_back({run, kWhyNoTrace}); }
+void Scheduler::RunEnded(std::int64_t run) {
+    ended.push_back({run, kWhyNoTrace});
+    // At once, and not when its ending is stored: it is in nobody's way any more.
+    if (const auto task = running.find(run); task != running.end()) {
+        runningTasks.Remove(task->second.task, task->second.app);
+    }
+}
 
 void Scheduler::ClockWasSet() {
     clock.ClockWasSet();
@@ -147,11 +157,11 @@ void Scheduler::DoWork(const Moment& moment) {
     step.endings = std::min(ended.size(), kEndingsAtOnce);
     step.tasks = runningTasks;
     WriteTransaction transaction(store.UsedDatabase());
-    StoreEndings(*transaction, moment, step);
-    const bool more = RecordDueTasks(*transaction, moment);
+    StoreEndings(*transaction, moment, step.endings);
+    const bool more = RecordDueTasks(*transaction, moment, step);
     ReadQueue(*transaction);
     StartQueued(*transaction, moment, step);
-    const std::optional<int> nowCorrected = CorrectStarts(*transaction, moment);
+    const std::optional<std::int64_t> nowCorrected = CorrectStarts(*transaction, moment, step);
     transaction.Commit();
 
     moreDue = more;
@@ -164,13 +174,26 @@ void Scheduler::DoWork(const Moment& moment) {
         failedStarts.erase(run);
         host.Remove(run);
     }
+    for (const DamagedTask& task : step.damaged) {
+        syslog(LOG_ERR, "task store %s: %s: it is not started any more",
+               store.UsedDatabase().File().c_str(), task.problem.c_str());
+    }
     for (const Beginning& beginning : step.beginnings) {
         Begin(beginning);
     }
 }
 
-void Scheduler::StoreEndings(Connection& connection, const Moment& moment, Step& step) {
-    for (std::size_t index = 0; index < step.endings; ++index) {
+// Takes away the next start alone: somebody may still mend the rest.
+void Scheduler::LeaveOut(Connection& connection, const std::vector<DamagedTask>& tasks,
+                         Step& step) {
+    for (const DamagedTask& task : tasks) {
+        SetNextStart(connection, task.id, kNoStart);
+        step.damaged.push_back(task);
+    }
+}
+
+void Scheduler::StoreEndings(Connection& connection, const Moment& moment, std::size_t endings) {
+    for (std::size_t index = 0; index < endings; ++index) {
         const auto& [run, whyLost] = ended[index];
         const auto failed = failedStarts.find(run);
         if (failed != failedStarts.end()) {
@@ -180,16 +203,14 @@ void Scheduler::StoreEndings(Connection& connection, const Moment& moment, Step&
         } else {
             MarkLost(connection, run, whyLost, moment.now, host.Output(run));
         }
-        if (const auto task = running.find(run); task != running.end()) {
-            step.tasks.Remove(task->second.task, task->second.app);
-        }
     }
 }
 
 // Whether there may be more of them.
-bool Scheduler::RecordDueTasks(Connection& connection, const Moment& moment) {
-    const std::vector<StoredStart> due = ReadDueTasks(connection, moment.now, kDueAtOnce);
-    for (const auto& [task, start] : due) {
+bool Scheduler::RecordDueTasks(Connection& connection, const Moment& moment, Step& step) {
+    const StoredStarts due = ReadDueTasks(connection, moment.now, kDueAtOnce);
+    LeaveOut(connection, due.damaged, step);
+    for (const auto& [task, start] : due.tasks) {
         const DuePlan plan = PlanDueTask(task, start, moment);
         for (const PlannedStart& planned : plan.starts) {
             InsertRun(connection,
@@ -200,7 +221,7 @@ bool Scheduler::RecordDueTasks(Connection& connection, const Moment& moment) {
         SetNextStart(connection, task.id, plan.next);
         TrimRunsOfTask(connection, task.id);
     }
-    return due.size() == std::size_t{kDueAtOnce};
+    return due.read == std::size_t{kDueAtOnce};
 }
 
 void Scheduler::ReadQueue(Connection& connection) {
@@ -221,21 +242,33 @@ void Scheduler::StartQueued(Connection& connection, const Moment& moment, Step& 
            step.beginnings.size() < kBegunAtOnce && looked++ < kQueuedAtOnce) {
         const std::int64_t run = queue.begin()->second;
         queue.erase(queue.begin());
-        const std::optional<TaskOfRun> queued = ReadTaskOfQueued(connection, run);
+        std::optional<TaskOfRun> queued;
+        try {
+            queued = ReadTaskOfQueued(connection, run);
+        } catch (const StoreFailure&) {
+            RunEnding ending;
+            ending.ended = RunTimeOf(moment.now);
+            ending.why = kWhyDamaged;
+            MarkEnded(connection, run, ending, {});
+            continue;
+        }
         if (!queued) {
-            // Removed, and its runs with it.
+            // Its task was removed.
             continue;
         }
         const TaskData& task = queued->task;
         const std::string_view why = WhyNotStarted(task, queued->reason, step.tasks);
-        if (!why.empty()) {
+        if (why.empty()) {
+            MarkRunning(connection, run, host.BootId(), moment.now);
+        } else {
             MarkSkipped(connection, run, why);
-            continue;
         }
-        MarkRunning(connection, run, host.BootId(), moment.now);
         if (queued->reason == RunReason::kByHand) {
             // Those by the schedule have been trimmed when they were recorded.
             TrimRunsOfTask(connection, task.id);
+        }
+        if (!why.empty()) {
+            continue;
         }
         step.tasks.Add(task.id, task.app);
         Beginning beginning;
@@ -249,12 +282,14 @@ void Scheduler::StartQueued(Connection& connection, const Moment& moment, Step& 
 }
 
 // Yields where to go on.
-std::optional<int> Scheduler::CorrectStarts(Connection& connection, const Moment& moment) const {
+std::optional<std::int64_t> Scheduler::CorrectStarts(Connection& connection, const Moment& moment,
+                                                     Step& step) const {
     if (!Corrects(moment)) {
         return corrected;
     }
-    const std::vector<StoredStart> tasks = ReadTasksAfter(connection, *corrected, kCorrectedAtOnce);
-    for (const auto& [task, start] : tasks) {
+    const StoredStarts found = ReadTasksAfter(connection, *corrected, kCorrectedAtOnce);
+    LeaveOut(connection, found.damaged, step);
+    for (const auto& [task, start] : found.tasks) {
         // What has come by now is dealt with as due.
         if (TimeOf(start) <= moment.now) {
             continue;
@@ -264,8 +299,7 @@ std::optional<int> Scheduler::CorrectStarts(Connection& connection, const Moment
             SetNextStart(connection, task.id, next);
         }
     }
-    return tasks.size() < std::size_t{kCorrectedAtOnce} ? std::nullopt
-                                                        : std::optional(tasks.back().task.id);
+    return found.read < std::size_t{kCorrectedAtOnce} ? std::nullopt : std::optional(found.last);
 }
 
 void Scheduler::Begin(const Beginning& beginning) {

@@ -21,6 +21,7 @@
 #include "appliance/scheduler/Planner.h"
 #include "appliance/scheduler/RunHost.h"
 #include "appliance/store/TaskStore.h"
+#include "appliance/store/TaskTable.h"
 
 namespace orva {
 
@@ -91,6 +92,8 @@ class Scheduler {
         // So many of the first ended runs are stored.
         std::size_t endings = 0;
         std::vector<Beginning> beginnings;
+        // Tasks that are left out from now on.
+        std::vector<DamagedTask> damaged;
         // The tasks that have runs going on after it.
         RunningTasks tasks;
     };
@@ -101,11 +104,13 @@ class Scheduler {
     void ResumeQueue(Connection& connection, const Moment& moment);
     bool HasWork(const Moment& moment);
     void DoWork(const Moment& moment);
-    void StoreEndings(Connection& connection, const Moment& moment, Step& step);
-    bool RecordDueTasks(Connection& connection, const Moment& moment);
+    static void LeaveOut(Connection& connection, const std::vector<DamagedTask>& tasks, Step& step);
+    void StoreEndings(Connection& connection, const Moment& moment, std::size_t endings);
+    bool RecordDueTasks(Connection& connection, const Moment& moment, Step& step);
     void ReadQueue(Connection& connection);
     void StartQueued(Connection& connection, const Moment& moment, Step& step);
-    std::optional<int> CorrectStarts(Connection& connection, const Moment& moment) const;
+    std::optional<std::int64_t> CorrectStarts(Connection& connection, const Moment& moment,
+                                              Step& step) const;
     void Begin(const Beginning& beginning);
     void ForgetQueue();
     bool Corrects(const Moment& moment) const;
@@ -121,6 +126,7 @@ class Scheduler {
     std::set<std::pair<absl::Time, std::int64_t>> queue;
     std::int64_t lastQueued = 0;
     std::map<std::int64_t, RunningTask> running;
+    // Of those runs the ones that have not ended.
     RunningTasks runningTasks;
     // Runs that have ended and whose rows still say that they go on.
     std::deque<EndedRun> ended;
@@ -129,7 +135,7 @@ class Scheduler {
 
     // The next starts of tasks up to this id hold for the zone and the clock as they are; nothing
     // when all do.
-    std::optional<int> corrected = 0;
+    std::optional<std::int64_t> corrected = 0;
     absl::TimeZone zoneOfStarts;
     bool clockTrusted = true;
     bool moreDue = false;

@@ -12,6 +12,7 @@
 #include "appliance/store/Failures.h"
 #include "appliance/store/TaskList.h"
 #include "appliance/store/TaskRecord.h"
+#include "appliance/store/TaskSections.h"
 #include "appliance/store/TaskStore.h"
 #include "platform/schedtask.h"
 
@@ -43,9 +44,9 @@ int SetFlag(Record* task, orva::TaskFlag flag, int value, int line = __builtin_L
     });
 }
 
-// Why the task cannot be stored; nothing when it can. A task that lacks one of these would be in
-// the list and of no use to anybody.
-std::optional<std::string> WhatIsMissing(const TaskData& task) {
+// Why the task cannot be stored; nothing when it can. A task that lacks one of these, or has a
+// command that cannot be run, would be in the list and of no use to anybody.
+std::optional<std::string> WhyNotStored(const TaskData& former, const TaskData& task) {
     if (task.name.empty()) {
         return "basic.task_name: is missing";
     }
@@ -55,6 +56,11 @@ std::optional<std::string> WhatIsMissing(const TaskData& task) {
     if (task.owner.empty()) {
         return "basic.owner: is missing, and user id " + std::to_string(::geteuid()) +
                " has no account to own the task";
+    }
+    // What has one already can still be switched off.
+    if (const auto problem = orva::CommandProblem(task.command);
+        problem && task.command != former.command) {
+        return "command: " + *problem;
     }
     return std::nullopt;
 }
@@ -101,7 +107,7 @@ int ORVASchedTaskSave(Record* task) {
     if (task == nullptr) {
         return Fail(orva::kErrBadArgument);
     }
-    if (const auto problem = WhatIsMissing(task->Data())) {
+    if (const auto problem = WhyNotStored(task->Base(), task->Data())) {
         syslog(LOG_NOTICE, "task refused: %s", problem->c_str());
         return Fail(orva::kErrBadArgument);
     }

@@ -25,7 +25,8 @@ class SchedulerLink {
     // No message or answer is longer than so many bytes.
     static constexpr std::size_t kLongestMessage = 512;
 
-    // Whether a scheduler of this root is running.
+    // Whether a scheduler of this root is running. False as well for an account that may not open
+    // the lock file: those who may write the task store's directory may.
     static bool IsAlive();
 
     // Tells the scheduler, if there is one, to look at the store again. Never waits; a scheduler

@@ -108,6 +108,18 @@ constexpr std::array kMigrations = {
         DELETE FROM run_output WHERE run = OLD.id;
     END;
     )sql",
+    R"sql(
+    -- The starts by the schedule that have been put on record. Apart from the runs, of which only
+    -- the last ones of a task are kept: a clock that is put back brings an instant again whose run
+    -- is long gone.
+    CREATE TABLE recorded_start (
+        task INTEGER NOT NULL,
+        occurrence INTEGER NOT NULL,
+        PRIMARY KEY (task, occurrence)
+    ) WITHOUT ROWID;
+    INSERT INTO recorded_start SELECT task, occurrence FROM run
+        WHERE occurrence IS NOT NULL AND task IN (SELECT id FROM task);
+    )sql",
 };
 
 constexpr std::int64_t kVersion = static_cast<std::int64_t>(kMigrations.size());

@@ -1,17 +1,53 @@
 #include "appliance/store/TaskRecord.h"
 
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <map>
+#include <mutex>
+#include <string>
+
+#include "appliance/root/Root.h"
 #include "appliance/store/Accounts.h"
 #include "appliance/store/TaskList.h"
+#include "appliance/store/TaskStore.h"
 
 namespace orva {
+namespace {
 
-const SharedTask& NewTaskDefaults() {
-    static const SharedTask defaults = [] {
-        auto task = std::make_shared<TaskData>();
-        task->owner = OwnAccount();
-        return task;
-    }();
-    return defaults;
+SharedTask NewTaskOf(const std::string& owner) {
+    auto task = std::make_shared<TaskData>();
+    task->owner = owner;
+    return task;
+}
+
+// The defaults that belong to the account `user`; null when it has no name. Names are asked for
+// once: name services may be slow.
+SharedTask NewTaskOf(uid_t user) {
+    static std::mutex mutex;
+    static std::map<uid_t, SharedTask> known;
+    const std::lock_guard lock(mutex);
+    const auto found = known.find(user);
+    if (found != known.end()) {
+        return found->second;
+    }
+    const std::string name = AccountName(user);
+    return name.empty() ? nullptr : known.emplace(user, NewTaskOf(name)).first->second;
+}
+
+}  // namespace
+
+SharedTask NewTaskDefaults() {
+    static const SharedTask ownDefaults = NewTaskOf(OwnAccount());
+    static const std::string folder =
+        std::filesystem::path(TaskStore::kDatabaseFile).parent_path().string();
+    struct stat status {};
+    if (::stat(ResolvePath(folder).c_str(), &status) == 0) {
+        if (SharedTask defaults = NewTaskOf(status.st_uid)) {
+            return defaults;
+        }
+    }
+    return ownDefaults;
 }
 
 }  // namespace orva

@@ -77,7 +77,10 @@ struct _tag_orva_sched_task_ {
 
 namespace orva {
 
-// What a new record starts as.
-const SharedTask& NewTaskDefaults();
+// What a new record starts as. It belongs to the account that the task store's folder belongs to,
+// as the scheduler does: tasks of root, on an installed appliance, even when the web-API server
+// makes them. It belongs to this program's account while there is no folder, or nobody that it
+// belongs to.
+SharedTask NewTaskDefaults();
 
 }  // namespace orva

@@ -9,6 +9,8 @@ namespace orva {
 namespace {
 
 constexpr std::size_t kLongestName = 255;
+// Linux: 32 pages of 4 KiB, with the NUL at the end.
+constexpr std::size_t kLongestCommand = 131'071;
 constexpr std::size_t kLongestQuote = 80;
 
 bool IsControl(unsigned char byte) { return byte < 0x20 || byte == 0x7f; }
@@ -158,6 +160,13 @@ std::optional<std::string> NameProblem(std::string_view name) {
     }
     if (HasWideControl(name)) {
         return "holds a control character";
+    }
+    return std::nullopt;
+}
+
+std::optional<std::string> CommandProblem(std::string_view command) {
+    if (command.size() > kLongestCommand) {
+        return "is longer than " + std::to_string(kLongestCommand) + " bytes";
     }
     return std::nullopt;
 }

@@ -59,6 +59,10 @@ std::optional<int> ParseTaskId(const Json::Value& id);
 // control characters.
 std::optional<std::string> NameProblem(std::string_view name);
 
+// What is wrong with a task's command; nothing when it may be one: 131,071 bytes at most. The
+// kernel starts no program with a longer argument, so no shell could be given it.
+std::optional<std::string> CommandProblem(std::string_view command);
+
 // Applies "task_name", "owner" and "enabled" of the section to `task`, which holds what the task
 // with its id holds now. Absent and null members keep that. On a refused member `task` may be
 // changed in part.

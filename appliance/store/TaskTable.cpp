@@ -167,11 +167,24 @@ void BindTask(SQLite::Statement& statement, const TaskData& task, StartSecond ne
     BindStart(statement, Parameter(kNextStart), nextStart);
 }
 
-std::vector<StoredStart> StoredStartsOf(SQLite::Statement& rows) {
-    std::vector<StoredStart> starts;
+// In a damaged row it may be no number: that sorts behind all numbers and comes never.
+StartSecond StartOf(const SQLite::Column& column) {
+    return column.isInteger() || column.isFloat() ? column.getInt64() : kNoStart;
+}
+
+StoredStarts StoredStartsOf(SQLite::Statement& rows) {
+    StoredStarts starts;
     while (rows.executeStep()) {
+        ++starts.read;
+        starts.last = rows.getColumn(kId).getInt64();
         const SQLite::Column start = rows.getColumn(kNextStart);
-        starts.push_back({TaskOf(rows), start.isNull() ? kNoStart : start.getInt64()});
+        try {
+            starts.tasks.push_back({TaskOf(rows), StartOf(start)});
+        } catch (const StoreFailure& failure) {
+            if (!start.isNull()) {
+                starts.damaged.push_back({starts.last, failure.what()});
+            }
+        }
     }
     return starts;
 }
@@ -252,7 +265,14 @@ bool RemoveTask(Connection& connection, int id) {
         }
     }
     {
-        Query query = connection.Prepare("DELETE FROM run WHERE task = ? AND state = 'queued'");
+        Query query = connection.Prepare(
+            "UPDATE run SET state = 'skipped', why = 'deleted' "
+            "WHERE task = ? AND state = 'queued'");
+        query->bind(1, id);
+        query->exec();
+    }
+    {
+        Query query = connection.Prepare("DELETE FROM recorded_start WHERE task = ?");
         query->bind(1, id);
         query->exec();
     }
@@ -285,14 +305,14 @@ std::optional<std::vector<int>> TasksChangedAfter(Connection& connection, std::i
     return tasks;
 }
 
-std::vector<StoredStart> ReadDueTasks(Connection& connection, absl::Time now, int most) {
+StoredStarts ReadDueTasks(Connection& connection, absl::Time now, int most) {
     Query query = connection.Prepare(kSelectDue);
     query->bind(1, absl::ToUnixSeconds(now));
     query->bind(2, most);
     return StoredStartsOf(*query);
 }
 
-std::vector<StoredStart> ReadTasksAfter(Connection& connection, int after, int most) {
+StoredStarts ReadTasksAfter(Connection& connection, std::int64_t after, int most) {
     Query query = connection.Prepare(kSelectAfter);
     query->bind(1, after);
     query->bind(2, most);
@@ -302,10 +322,10 @@ std::vector<StoredStart> ReadTasksAfter(Connection& connection, int after, int m
 StartSecond EarliestStart(Connection& connection) {
     Query query = connection.Prepare(
         "SELECT next_start FROM task WHERE next_start IS NOT NULL ORDER BY next_start LIMIT 1");
-    return query->executeStep() ? query->getColumn(0).getInt64() : kNoStart;
+    return query->executeStep() ? StartOf(query->getColumn(0)) : kNoStart;
 }
 
-void SetNextStart(Connection& connection, int id, StartSecond start) {
+void SetNextStart(Connection& connection, std::int64_t id, StartSecond start) {
     Query query = connection.Prepare("UPDATE task SET next_start = ?2 WHERE id = ?1");
     query->bind(1, id);
     BindStart(*query, 2, start);

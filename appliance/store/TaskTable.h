@@ -30,7 +30,8 @@ int InsertTask(Connection& connection, const TaskData& task, StartSecond nextSta
 [[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart,
                               absl::Time now);
 
-// Removes the task with its queued runs. False when there is none.
+// Removes the task, and which of its starts are on record; its queued runs count as skipped. False
+// when there is none.
 [[nodiscard]] bool RemoveTask(Connection& connection, int id);
 
 // The highest id that was ever given to a task; 0 when there was none.
@@ -50,17 +51,31 @@ struct StoredStart {
     StartSecond start = kNoStart;
 };
 
+// A row that has a next start and holds what no task can.
+struct DamagedTask {
+    std::int64_t id = 0;
+    std::string problem;
+};
+
+struct StoredStarts {
+    std::vector<StoredStart> tasks;
+    std::vector<DamagedTask> damaged;
+    // How many rows were read, and the id of the last one.
+    std::size_t read = 0;
+    std::int64_t last = 0;
+};
+
 // Up to `most` tasks whose next start has come by `now`, in order of it.
-std::vector<StoredStart> ReadDueTasks(Connection& connection, absl::Time now, int most);
+StoredStarts ReadDueTasks(Connection& connection, absl::Time now, int most);
 
 // Up to `most` tasks with an id above `after`, by id.
-std::vector<StoredStart> ReadTasksAfter(Connection& connection, int after, int most);
+StoredStarts ReadTasksAfter(Connection& connection, std::int64_t after, int most);
 
 // The earliest next start of all tasks; kNoStart when there is none.
 StartSecond EarliestStart(Connection& connection);
 
 // Stores a task's next start and nothing else; does not count as a change of the task.
-void SetNextStart(Connection& connection, int id, StartSecond start);
+void SetNextStart(Connection& connection, std::int64_t id, StartSecond start);
 
 // Queues a run that was asked for by hand. False when there is no such task.
 [[nodiscard]] bool QueueRun(Connection& connection, int task, absl::Time now,

@@ -45,6 +45,10 @@ class Importer {
         if (const auto problem = ApplyTaskDocument(document, task, accounts)) {
             return problem->text;
         }
+        const auto problem = CommandProblem(task.command);
+        if (problem && !(at && stored.Task(*at).command == task.command)) {
+            return "command: " + *problem;
+        }
         task.id = id;
         tasks.push_back(std::move(task));
         return {};

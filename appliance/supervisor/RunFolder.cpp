@@ -27,6 +27,9 @@ constexpr mode_t kFileMode = 0640;
 // Beyond the longest command that a task may hold, and the environment.
 constexpr std::size_t kLongestRecords = std::size_t{64} * 1024 * 1024;
 
+// For pidfd_send_signal, since Linux 6.9; the C library's headers may be older.
+constexpr unsigned kSignalProcessGroup = 1U << 2;
+
 std::string Problem(const std::string& doing) {
     if (errno == ENOSPC || errno == EDQUOT) {
         return "no space for output";
@@ -71,11 +74,15 @@ bool WriteWhole(int file, std::string_view content) {
     return true;
 }
 
+// None with errno set; that is ENOENT only when there is no such file.
 std::optional<std::string> ReadWhole(const std::string& path) {
     const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
     struct stat status {};
-    if (!file.IsOpen() || ::fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
-        static_cast<std::uint64_t>(status.st_size) > kLongestRecords) {
+    if (!file.IsOpen() || ::fstat(file.Get(), &status) != 0) {
+        return std::nullopt;
+    }
+    if (!S_ISREG(status.st_mode) || static_cast<std::uint64_t>(status.st_size) > kLongestRecords) {
+        errno = EINVAL;
         return std::nullopt;
     }
     std::string content(static_cast<std::size_t>(status.st_size), '\0');
@@ -95,6 +102,27 @@ bool Allocate(int file, off_t size) {
 // Takes the space, and leaves the file as long as it is. Not every file system can.
 bool AllocateBeyondEnd(int file, off_t size) {
     return ::fallocate(file, FALLOC_FL_KEEP_SIZE, 0, size) == 0 || errno == EOPNOTSUPP;
+}
+
+enum class Lock { kHeld, kFree, kNoFile, kUnknown };
+
+Lock LookAtLock(const std::string& folder) {
+    const FileDescriptor file(
+        ::open((folder + kProcessFile).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+    if (!file.IsOpen()) {
+        return errno == ENOENT ? Lock::kNoFile : Lock::kUnknown;
+    }
+    if (::flock(file.Get(), LOCK_SH | LOCK_NB) == 0) {
+        return Lock::kFree;
+    }
+    return errno == EWOULDBLOCK ? Lock::kHeld : Lock::kUnknown;
+}
+
+// Of the process with this id that started at that time, if it is there.
+FileDescriptor HoldProcess(pid_t process, std::uint64_t start) {
+    FileDescriptor held(static_cast<int>(::syscall(SYS_pidfd_open, process, 0)));
+    // Asked after the process was taken hold of: then it is the one that had the id at this start.
+    return held.IsOpen() && ProcessStart(process) == start ? std::move(held) : FileDescriptor();
 }
 
 template <class Records>
@@ -149,10 +177,37 @@ std::optional<FileDescriptor> RunFolder::Create(const RunOrder& order, std::stri
     return process;
 }
 
-bool RunFolder::IsSupervised() const {
-    const FileDescriptor file(::open((path + kProcessFile).c_str(), O_RDONLY | O_CLOEXEC));
-    return file.IsOpen() && ::flock(file.Get(), LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+RunFolder::State RunFolder::Look() const {
+    const Lock lock = LookAtLock(path);
+    const int lockError = errno;
+    // In this order: the ending may come between the two.
+    const std::optional<std::string> ending = ReadWhole(path + kEndingFile);
+    if (!ending && errno != ENOENT) {
+        return State::kUnknown;
+    }
+    if (ending && EndingFromRecords(*ending)) {
+        return State::kEnded;
+    }
+    switch (lock) {
+        case Lock::kUnknown:
+            errno = lockError;
+            return State::kUnknown;
+        case Lock::kHeld:
+            return State::kSupervised;
+        case Lock::kNoFile:
+            return State::kNotBegun;
+        case Lock::kFree:
+            break;
+    }
+    const std::optional<std::string> process = ReadWhole(path + kProcessFile);
+    if (!process) {
+        return State::kUnknown;
+    }
+    // A supervisor says who it is before it starts the command.
+    return ProcessFromRecords(*process) ? State::kAbandoned : State::kNotBegun;
 }
+
+bool RunFolder::IsSupervised() const { return LookAtLock(path) == Lock::kHeld; }
 
 std::optional<RunOrder> RunFolder::Order() const {
     return ReadRecords(path + kOrderFile, OrderFromRecords);
@@ -173,11 +228,13 @@ FileDescriptor RunFolder::WatchSupervisor() const {
     if (!process || process->bootId != BootId()) {
         return {};
     }
-    FileDescriptor watched(static_cast<int>(::syscall(SYS_pidfd_open, process->supervisor, 0)));
-    // Asked after the process was taken hold of: then it is the one that had the id at this start.
-    return watched.IsOpen() && ProcessStart(process->supervisor) == process->supervisorStart
-               ? std::move(watched)
-               : FileDescriptor();
+    return HoldProcess(process->supervisor, process->supervisorStart);
+}
+
+bool RunFolder::RecordStop(std::uint64_t killAt) const {
+    const FileDescriptor file(
+        ::open((path + kProcessFile).c_str(), O_WRONLY | O_APPEND | O_CLOEXEC | O_NOFOLLOW));
+    return file.IsOpen() && WriteWhole(file.Get(), StopRecord(killAt));
 }
 
 bool RunFolder::SignalCommand(int signal) const {
@@ -185,6 +242,23 @@ bool RunFolder::SignalCommand(int signal) const {
     // While its supervisor lives and has recorded no ending, the command's id is nobody else's.
     return process && process->command > 0 && process->bootId == BootId() && IsSupervised() &&
            !Ending() && ::kill(-process->command, signal) == 0;
+}
+
+FileDescriptor RunFolder::KillAbandonedCommand() const {
+    const std::optional<RunProcess> process = Process();
+    if (!process || process->command <= 0 || process->commandStart == 0 ||
+        process->bootId != BootId() || Look() != State::kAbandoned) {
+        return {};
+    }
+    FileDescriptor shell = HoldProcess(process->command, process->commandStart);
+    if (!shell.IsOpen()) {
+        return {};
+    }
+    const bool sent =
+        ::syscall(SYS_pidfd_send_signal, shell.Get(), SIGKILL, nullptr, kSignalProcessGroup) == 0 ||
+        // Older kernels know no groups there. The shell keeps the group's id.
+        (errno == EINVAL && ::kill(-process->command, SIGKILL) == 0);
+    return sent ? std::move(shell) : FileDescriptor();
 }
 
 bool RunFolder::Remove() const {

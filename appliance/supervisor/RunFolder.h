@@ -3,7 +3,8 @@
 // ended and its row is stored, the scheduler removes it.
 //
 //   order    what is to be run
-//   process  who runs it; locked (flock) for as long as the supervisor lives
+//   process  who runs it, and whether it is to stop; locked (flock) for as long as the supervisor
+//            lives
 //   output   first and last 64 KiB of what the command prints, allocated before it starts
 //   ending   how it ended: absent until then, then complete and durable
 //
@@ -42,9 +43,16 @@ class RunFolder {
     // text that suits RunEnding::why; then there is no folder.
     [[nodiscard]] std::optional<FileDescriptor> Create(const RunOrder& order, std::string& error);
 
-    // Whether a supervisor is caring for the run, or the scheduler is just about to start one.
-    // False and no Ending(): the run is lost, and it is certain that nothing will be recorded any
-    // more. (Ask in this order: the ending may come between the two.)
+    enum class State {
+        kUnknown,     // it cannot be read now, for want of descriptors perhaps; errno says why
+        kNotBegun,    // nobody cares for it, and its command has not been started
+        kSupervised,  // a supervisor cares for it, or the scheduler is about to start one
+        kEnded,       // there is an ending
+        kAbandoned,   // nobody cares for it any more, and no ending will ever be recorded
+    };
+    [[nodiscard]] State Look() const;
+
+    // Whether somebody certainly holds the lock. That may be so for a moment after the ending.
     [[nodiscard]] bool IsSupervised() const;
 
     // None when it is not there, or not complete.
@@ -61,8 +69,17 @@ class RunFolder {
     // (then ask again while IsSupervised()).
     [[nodiscard]] FileDescriptor WatchSupervisor() const;
 
+    // Records that the run is to stop, for its supervisor and for the next scheduler; in space
+    // that was taken before. `killAt` as in RunProcess. False, with errno, when that fails.
+    [[nodiscard]] bool RecordStop(std::uint64_t killAt) const;
+
     // Sends the signal to the command's process group. False when the command is not running.
     [[nodiscard]] bool SignalCommand(int signal) const;
+
+    // Kills the process group of the command in a folder that is kAbandoned. A pidfd of the
+    // command's shell, readable when that has ended. Not open when the shell is not there any more,
+    // or is not certainly the one that was started; then nothing is killed.
+    [[nodiscard]] FileDescriptor KillAbandonedCommand() const;
 
     // Removes the folder and what is in it. False with a log line when that fails; true when there
     // was none.

@@ -1,6 +1,7 @@
 #include "appliance/supervisor/RunRecords.h"
 
 #include <fcntl.h>
+#include <time.h>
 
 #include <charconv>
 #include <type_traits>
@@ -168,9 +169,16 @@ std::string SupervisorRecords(const RunProcess& process) {
     return records;
 }
 
-std::string CommandRecord(pid_t command) {
+std::string CommandRecords(pid_t command, std::uint64_t start) {
     std::string records;
+    Add(records, "commandStart", start);
     Add(records, "command", command);
+    return records;
+}
+
+std::string StopRecord(std::uint64_t killAt) {
+    std::string records;
+    Add(records, "killAt", killAt);
     return records;
 }
 
@@ -186,6 +194,10 @@ std::optional<RunProcess> ProcessFromRecords(std::string_view records) {
             good = Read(value, process.supervisor);
         } else if (name == "command") {
             good = Read(value, process.command);
+        } else if (name == "commandStart") {
+            good = Read(value, process.commandStart);
+        } else if (name == "killAt") {
+            good = Read(value, process.killAt);
         }
     }
     if (!good || process.bootId.empty() || process.supervisor <= 0 || process.command < 0) {
@@ -196,6 +208,13 @@ std::optional<RunProcess> ProcessFromRecords(std::string_view records) {
 
 RunTime RunTimeNow() {
     return std::chrono::floor<std::chrono::microseconds>(std::chrono::system_clock::now());
+}
+
+std::uint64_t MonotonicNow() {
+    timespec now{};
+    ::clock_gettime(CLOCK_MONOTONIC, &now);
+    return static_cast<std::uint64_t>(now.tv_sec) * 1'000'000 +
+           static_cast<std::uint64_t>(now.tv_nsec) / 1000;
 }
 
 std::string BootId() {

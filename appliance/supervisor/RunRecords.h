@@ -37,6 +37,10 @@ struct RunProcess {
     pid_t supervisor = 0;
     std::uint64_t supervisorStart = 0;  // in clock ticks since the machine started
     pid_t command = 0;                  // also its process group; 0 before it has started
+    std::uint64_t commandStart = 0;     // as supervisorStart; 0 when it is not known
+    // When a command that was asked to end is killed, in microseconds of the monotonic clock; 0
+    // when it was not asked.
+    std::uint64_t killAt = 0;
 
     bool operator==(const RunProcess&) const = default;
 };
@@ -59,13 +63,17 @@ std::optional<RunOrder> OrderFromRecords(std::string_view records);
 std::string ToRecords(const RunEnding& ending);
 std::optional<RunEnding> EndingFromRecords(std::string_view records);
 
-// A process's records are written in two parts, the second one once the command has been started.
+// A process's records are written in parts: the supervisor's, the command's once it has been
+// started, and one for a stop whenever that is asked for.
 std::string SupervisorRecords(const RunProcess& process);
-std::string CommandRecord(pid_t command);
+std::string CommandRecords(pid_t command, std::uint64_t start);
+std::string StopRecord(std::uint64_t killAt);
 std::optional<RunProcess> ProcessFromRecords(std::string_view records);
 
 // The present instant of the machine's wall clock.
 RunTime RunTimeNow();
+// The present time of the monotonic clock, in microseconds.
+std::uint64_t MonotonicNow();
 // The running machine's boot id; empty when /proc does not tell it.
 std::string BootId();
 // When the process was started, in clock ticks since the machine started; none when there is no

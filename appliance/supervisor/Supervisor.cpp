@@ -19,6 +19,7 @@
 #include "appliance/supervisor/CommandStart.h"
 #include "appliance/supervisor/OutputFile.h"
 #include "appliance/supervisor/Owner.h"
+#include "appliance/supervisor/ProcessGroup.h"
 #include "appliance/supervisor/RunFiles.h"
 #include "appliance/supervisor/RunRecords.h"
 
@@ -29,6 +30,13 @@ namespace {
 // it stays as it is.
 constexpr int kPipeSize = 256 * 1024;
 constexpr mode_t kEndingMode = 0640;
+
+// How often a stopped command's group is looked at that outlives its shell.
+constexpr int kShortestPause = 5;  // milliseconds
+constexpr int kLongestPause = 200;
+// A killed process ends as soon as the kernel lets it; one that hangs there must not keep the run
+// from ending.
+constexpr std::uint64_t kTimeToDie = 5'000'000;  // microseconds
 
 bool WriteAll(int file, std::string_view content) {
     while (!content.empty()) {
@@ -100,6 +108,15 @@ bool SayWhoWeAre() {
     return WriteAll(kSupervisorLock, SupervisorRecords(process));
 }
 
+// When the command is to be killed; 0 when nobody has asked for a stop.
+std::uint64_t KillTime() {
+    std::array<char, kProcessSpace> records{};
+    const ssize_t got = ::pread(kSupervisorLock, records.data(), records.size(), 0);
+    const std::optional<RunProcess> process =
+        ProcessFromRecords({records.data(), got > 0 ? static_cast<std::size_t>(got) : 0});
+    return process ? process->killAt : 0;
+}
+
 // The command's standard output and error.
 class OutputPipe {
   public:
@@ -134,7 +151,12 @@ class OutputPipe {
                 watched[1].fd = -1;
             }
         }
-        // What others print from now on is not the command's: the pipe may never become empty.
+        KeepWhatIsThere(output);
+    }
+
+    // No more than that: what others print from now on is not the command's, and the pipe may never
+    // become empty.
+    void KeepWhatIsThere(OutputWriter& output) {
         int left = 0;
         if (::ioctl(reading.Get(), FIONREAD, &left) != 0) {
             return;
@@ -145,6 +167,19 @@ class OutputPipe {
                 return;
             }
             left -= static_cast<int>(got);
+        }
+    }
+
+    // Keeps what is printed in the next so many milliseconds.
+    void KeepFor(OutputWriter& output, int milliseconds) {
+        const std::uint64_t end = MonotonicNow() + static_cast<std::uint64_t>(milliseconds) * 1000;
+        pollfd watched{reading.Get(), POLLIN, 0};
+        for (std::uint64_t now = MonotonicNow(); now < end; now = MonotonicNow()) {
+            if (::poll(&watched, 1, static_cast<int>((end - now) / 1000) + 1) == 1 &&
+                Take(output, buffer.size()) == 0) {
+                // Nobody has it open any more.
+                watched.fd = -1;
+            }
         }
     }
 
@@ -195,6 +230,7 @@ class SupervisedRun {
         const bool shellRuns = command->WaitForShell(why);
         ending.started = RunTimeNow();
         pipe.KeepUntilEnd(*output, command->Watch());
+        EndStoppedGroup();
         ending.ended = RunTimeNow();
 
         // Not reaped yet: as long as the ending is not written, the command's id must not become
@@ -224,6 +260,30 @@ class SupervisedRun {
     }
 
   private:
+    // A stop is for all that runs in the command's group. As long as the shell is not reaped, the
+    // group's id is given to nobody else.
+    void EndStoppedGroup() {
+        const std::uint64_t killAt = KillTime();
+        if (killAt == 0) {
+            return;
+        }
+        int pause = kShortestPause;
+        while (HasLivingProcess(command->Id())) {
+            const std::uint64_t now = MonotonicNow();
+            if (now >= killAt + kTimeToDie) {
+                syslog(LOG_ERR, "%s: processes of the stopped command cannot be killed",
+                       folder.c_str());
+                break;
+            }
+            if (now >= killAt) {
+                ::kill(-command->Id(), SIGKILL);
+            }
+            pipe.KeepFor(*output, pause);
+            pause = std::min(pause * 2, kLongestPause);
+        }
+        pipe.KeepWhatIsThere(*output);
+    }
+
     // False with the ending's `why` set.
     bool Start(RunEnding& ending) {
         // Who finds an empty process file and no ending takes the run for one that has not begun.
@@ -252,7 +312,8 @@ class SupervisedRun {
         if (!command) {
             return false;
         }
-        if (!WriteAll(kSupervisorLock, CommandRecord(command->Id()))) {
+        const std::uint64_t start = ProcessStart(command->Id()).value_or(0);
+        if (!WriteAll(kSupervisorLock, CommandRecords(command->Id(), start))) {
             syslog(LOG_WARNING, "cannot write the process file: %s", std::strerror(errno));
         }
         return true;

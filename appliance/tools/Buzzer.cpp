@@ -53,7 +53,7 @@ std::string NodeOf(const fs::path& device, const std::string& nodes) {
          entry.increment(error)) {
         const std::string name = entry->path().filename();
         if (name.starts_with("event")) {
-            return nodes + "/" + name;
+            return std::string(nodes).append("/").append(name);
         }
     }
     return {};

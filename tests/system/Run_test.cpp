@@ -33,6 +33,14 @@ std::set<std::string> Lines(const std::string& text) {
     return lines;
 }
 
+// The letter that /proc gives for the process's state; 0 when there is none.
+char StateOf(pid_t process) {
+    const std::string status =
+        orva::test::ReadWholeFile("/proc/" + std::to_string(process) + "/stat");
+    const std::size_t nameEnd = status.rfind(')');
+    return nameEnd == std::string::npos ? '\0' : status[nameEnd + 2];
+}
+
 std::string OwnHome() { return ::getpwuid(::geteuid())->pw_dir; }
 
 // Where a command of this account starts.
@@ -194,6 +202,35 @@ TEST_F(RunTest, EndsWithItsShellWhateverIsLeftInTheBackground) {
     run.Root().Write("go", "");
     // It has neither been blocked by a full pipe nor ended by a broken one.
     EXPECT_TRUE(WaitUntil([this] { return std::filesystem::exists(run.Root().Path() / "done"); }));
+}
+
+TEST_F(RunTest, AStoppedRunEndsWithTheWholeGroupOfItsCommand) {
+    run.Start(
+        "echo first; sh -c 'trap \"\" TERM; echo ready; "
+        "while ! test -e \"$ORVA_ROOT/go\"; do :; done; "
+        "echo last; echo >\"$ORVA_ROOT/done\"' & wait",
+        OwnName(), {{"ORVA_ROOT", run.Root().Path().string()}});
+    ASSERT_TRUE(WaitUntil([this] { return run.Printed() == "first\nready\n"; }));
+    // It ends by itself long before that.
+    ASSERT_TRUE(run.Folder().RecordStop(orva::MonotonicNow() + 1'000'000'000));
+    ASSERT_TRUE(run.Folder().SignalCommand(SIGTERM));
+    const pid_t shell = run.Folder().Process()->command;
+    ASSERT_TRUE(WaitUntil([shell] { return StateOf(shell) == 'Z'; }));
+    EXPECT_FALSE(run.Folder().Ending());
+    run.Root().Write("go", "");
+    EXPECT_EQ(run.End().signal, SIGTERM);
+    EXPECT_EQ(run.Printed(), "first\nready\nlast\n");
+}
+
+TEST_F(RunTest, AStopKillsWhatOutlivesTheShellWhenItsTimeHasCome) {
+    run.Start("sh -c 'trap \"\" TERM; echo $$; exec sleep 1000' & wait");
+    ASSERT_TRUE(WaitUntil([this] { return run.Printed().ends_with('\n'); }));
+    const pid_t left = std::atoi(run.Printed().c_str());
+    ASSERT_GT(left, 1);
+    ASSERT_TRUE(run.Folder().RecordStop(orva::MonotonicNow()));
+    ASSERT_TRUE(run.Folder().SignalCommand(SIGTERM));
+    EXPECT_EQ(run.End().signal, SIGTERM);
+    EXPECT_TRUE(StateOf(left) == 'Z' || StateOf(left) == 0);
 }
 
 TEST_F(RunTest, KeepsAllThatWasPrintedBeforeTheShellEnded) {

@@ -16,7 +16,6 @@ using orva::test::RunProcess;
 using testing::EndsWith;
 using testing::HasSubstr;
 using testing::MatchesRegex;
-using testing::Not;
 
 class TlsTest : public testing::Test {
   protected:

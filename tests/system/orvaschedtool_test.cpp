@@ -133,6 +133,16 @@ TEST_F(OrvaschedtoolTest, WrongUsageIsTold) {
     EXPECT_EQ(Run({"--history", "--list"}).status, 2);
     EXPECT_EQ(Run({"--output"}).status, 2);
     EXPECT_EQ(Run({"--output", "-1"}).status, 2);
+    const ProcessResult noRun = Run({"--output", "0"});
+    EXPECT_EQ(noRun.status, 2);
+    EXPECT_THAT(noRun.err, testing::StartsWith("--output: Value 0 not in range 1 to "
+                                               "9223372036854775807\n"));
+    const ProcessResult noJson = Run({"--list", "--json"});
+    EXPECT_EQ(noJson.status, 2);
+    EXPECT_EQ(noJson.out, "");
+    EXPECT_EQ(noJson.err, "orvaschedtool: --json goes with --next and --history only\n");
+    EXPECT_EQ(Run({"--json", "--output", "1"}).status, 2);
+    EXPECT_EQ(Run({"--beep", "1", "--json"}).status, 2);
     EXPECT_EQ(Run({"--help"}).status, 0);
 }
 

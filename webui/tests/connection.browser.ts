@@ -30,6 +30,8 @@ test('a lost connection is told, costs nothing that was typed, and comes back', 
     await appliance.startServer();
     // A server that was started anew knows no sessions.
     const dialog = app.getByRole('dialog', { name: 'Your session has ended' });
+    await expect(dialog).toBeVisible();
+    await expect(app.getByText('No connection to the appliance')).toHaveCount(0);
     await dialog.getByLabel('Access token').fill(appliance.token);
     await dialog.getByRole('button', { name: 'Sign in' }).click();
     await expect(dialog).toHaveCount(0);

@@ -58,9 +58,7 @@ test('a task that another client deletes while it is edited cannot be saved', as
     await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Too late');
     await appliance.call('delete', { task: 1 });
     await expect(app.getByText('Somebody deleted this task meanwhile.')).toBeVisible();
-    await app.getByRole('button', { name: 'Save' }).click();
-    await expect(app.getByText('The task could not be saved')).toBeVisible();
-    await expect(app.getByText('(code 4801)')).toBeVisible();
+    await expect(app.getByRole('button', { name: 'Save' })).toBeDisabled();
     await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Too late');
 });
 
@@ -69,6 +67,8 @@ test('the address of a task that does not exist says so', async ({ app }) => {
         window.location.hash = '#/tasks/4711';
     });
     await expect(app.getByText('There is no such task, or not any more.')).toBeVisible();
+    await app.getByRole('button', { name: 'Back to the tasks' }).click();
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
 });
 
 test('a change by another client is told while a task is edited', async ({ app, appliance }) => {
@@ -93,6 +93,55 @@ test('unsaved work is not left without a question', async ({ app }) => {
     await app.getByRole('button', { name: 'Cancel' }).click();
     await dialog.getByRole('button', { name: 'Leave' }).click();
     await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+});
+
+test('going back from unsaved work asks each time, and the history of the browser stays', async ({
+    app,
+}) => {
+    const back = () => app.evaluate(() => history.back());
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    const name = app.getByRole('textbox', { name: 'Name', exact: true });
+    await name.fill('Unsaved');
+    const dialog = app.getByRole('dialog', { name: 'Leave without saving?' });
+    for (let time = 0; time < 3; time++) {
+        await back();
+        await dialog.getByRole('button', { name: 'Stay' }).click();
+        await expect(dialog).toHaveCount(0);
+        await expect(app).toHaveURL(/#\/tasks\/1$/);
+        await expect(name).toHaveValue('Unsaved');
+    }
+    await back();
+    await dialog.getByRole('button', { name: 'Leave' }).click();
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+    await expect(app).toHaveURL(/#\/tasks$/);
+});
+
+test('going back after saving or cancelling does not open the form again', async ({ app }) => {
+    await app.getByRole('link', { name: 'History' }).click();
+    await expect(app.getByRole('heading', { name: 'History' })).toBeVisible();
+    await app.getByRole('link', { name: 'Tasks' }).click();
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('button', { name: 'Cancel' }).click();
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Saved signal');
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(rowOf(app, 'Saved signal')).toBeVisible();
+    await app.evaluate(() => history.back());
+    await expect(app.getByRole('heading', { name: 'History' })).toBeVisible();
+});
+
+test('an editor that was opened by its address gives way to the list', async ({ app }) => {
+    await app.getByRole('link', { name: 'History' }).click();
+    await expect(app.getByRole('heading', { name: 'History' })).toBeVisible();
+    await app.evaluate(() => {
+        window.location.hash = '#/tasks/1';
+    });
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Unsaved');
+    await app.getByRole('button', { name: 'Cancel' }).click();
+    await app.getByRole('dialog').getByRole('button', { name: 'Leave' }).click();
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+    await app.evaluate(() => history.back());
+    await expect(app.getByRole('heading', { name: 'History' })).toBeVisible();
 });
 
 test('what may not be edited is disabled with the reason', async ({ app }) => {

@@ -75,4 +75,5 @@ test('the history of a task that never ran is empty', async ({ app, appliance })
     await appliance.script('Idle', 'true');
     await pick(app, 'Idle', 'History');
     await expect(app.getByRole('heading', { name: 'No runs' })).toBeVisible();
+    await expect(app.getByRole('heading', { name: 'History of Idle' })).toBeVisible();
 });

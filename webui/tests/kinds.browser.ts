@@ -94,7 +94,10 @@ test('a recycle-bin task is previewed, made, changed, run and deleted', async ({
     await app.getByLabel('Each bin may hold').fill('1');
     await app.getByLabel('Remove first').selectOption('The largest files');
     await app.getByLabel('Files with certain extensions').check();
+    const notYet = app.getByText('Correct what is marked above first.');
+    await expect(notYet).toBeVisible();
     await app.getByLabel(/^Extensions/).fill('.pdf, docx');
+    await expect(notYet).toHaveCount(0);
     await app.getByLabel('By age').check();
     await app.getByLabel('In the bin for more than').fill('1');
     await app.getByRole('button', { name: 'Show what would go' }).click();

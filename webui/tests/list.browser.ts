@@ -70,7 +70,7 @@ test('pages hold as many tasks as asked for, and the address remembers them', as
 });
 
 test('a filter finds by words of the name and by kind', async ({ app }) => {
-    const search = app.getByRole('textbox', { name: 'Find by name' });
+    const search = app.getByRole('textbox', { name: 'Find' });
     await search.fill('documents');
     await expect(async () =>
         expect((await names(app)).toSorted()).toEqual([
@@ -95,7 +95,7 @@ test('typing in the filter reads the list once', async ({ app }) => {
             lists.push(request.postData() ?? '');
         }
     });
-    await app.getByRole('textbox', { name: 'Find by name' }).pressSequentially('documents');
+    await app.getByRole('textbox', { name: 'Find' }).pressSequentially('documents');
     await expect(async () => expect(await names(app)).toHaveLength(3)).toPass();
     expect(lists).toEqual(['{"sort_by":"next_trigger_time","sort_direction":"asc"}']);
 });
@@ -158,7 +158,7 @@ test('what may not be done is left out, with the reason', async ({ app }) => {
 
 test('the change of another client appears and disturbs nothing', async ({ app, appliance }) => {
     await app.getByRole('checkbox', { name: 'Select Lunch signal' }).check();
-    const search = app.getByRole('textbox', { name: 'Find by name' });
+    const search = app.getByRole('textbox', { name: 'Find' });
     await search.focus();
     await appliance.script('From elsewhere', 'true', { schedule: { hour: 0, minute: 1 } });
     await appliance.call('set_enable', { status: [{ id: 2, enable: false }] });

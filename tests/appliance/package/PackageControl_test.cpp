@@ -1,8 +1,10 @@
 #include "appliance/package/PackageControl.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <signal.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -11,12 +13,11 @@
 #include <filesystem>
 #include <thread>
 
+#include "appliance/util/FileDescriptor.h"
 #include "tests/appliance/util/Sandbox.h"
 
 namespace orva {
 namespace {
-
-using testing::HasSubstr;
 
 constexpr std::chrono::seconds kPatience{60};
 
@@ -177,6 +178,40 @@ TEST_F(PackageControlTest, TwoStartsAtOnceTakeTurns) {
     }
     EXPECT_THAT(statuses, testing::UnorderedElementsAre(1, 0, 0, 0));
     EXPECT_EQ(Calls("p"), "begin\nend\n");
+}
+
+TEST_F(PackageControlTest, WhoeverMayReadThePackagesFolderCannotHoldUpAStart) {
+    InstallFlag("p");
+    const FileDescriptor folder(
+        ::open((RootPath() + "/usr/orva/packages/p").c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_EQ(::flock(folder.Get(), LOCK_EX), 0);
+    EXPECT_EQ(Start("p"), "done: started");
+    struct stat status {};
+    ASSERT_EQ(::stat((RootPath() + "/run/orva/packages").c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 07777, 0700U);
+    ASSERT_EQ(::stat((RootPath() + "/run/orva/packages/p").c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 07777, 0600U);
+}
+
+TEST_F(PackageControlTest, DoesNotWaitForItsTurnForEver) {
+    InstallFlag("p");
+    Write("/run/orva/packages/p", "");
+    const FileDescriptor other(
+        ::open((RootPath() + "/run/orva/packages/p").c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_EQ(::flock(other.Get(), LOCK_EX), 0);
+    PackageControl::Limits limits;
+    limits.turn = std::chrono::milliseconds(1);
+    EXPECT_EQ(Start("p", limits),
+              "failed: another start or stop of it did not end within 1 second");
+    EXPECT_EQ(Calls("p"), "");
+}
+
+TEST_F(PackageControlTest, APackageThatCannotBeLockedIsLeftAlone) {
+    InstallFlag("p");
+    Write("/run/orva/packages", "a file");
+    EXPECT_EQ(Start("p"),
+              "failed: cannot be locked: " + RootPath() + "/run/orva/packages/p: Not a directory");
+    EXPECT_EQ(Calls("p"), "");
 }
 
 TEST_F(PackageControlTest, ASignalEndsTheCommandAndTheProgram) {

@@ -103,10 +103,10 @@ TEST_F(OrvaWebapidTest, LeavesOutModulesThatAreDamaged) {
 }
 
 TEST_F(OrvaWebapidTest, RefusesWrongUsage) {
-    EXPECT_NE(Run({"--none"}).status, 0);
-    EXPECT_NE(Run({"--request-timeout", "0"}).status, 0);
-    EXPECT_NE(Run({"--request-timeout", "x"}).status, 0);
-    EXPECT_NE(Run({"more"}).status, 0);
+    EXPECT_EQ(Run({"--none"}).status, 2);
+    EXPECT_EQ(Run({"--request-timeout", "0"}).status, 2);
+    EXPECT_EQ(Run({"--request-timeout", "x"}).status, 2);
+    EXPECT_EQ(Run({"more"}).status, 2);
 }
 
 TEST_F(OrvaWebapidTest, ExplainsItself) {

@@ -3,6 +3,7 @@
 #include <sys/file.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <filesystem>
 #include <future>
 
@@ -77,6 +78,16 @@ TEST_F(BinOpenerTest, WaitsUntilTheOtherCleanIsDone) {
     waiting.get_future().wait();
     first.reset();
     EXPECT_TRUE(second.get().bin.has_value());
+}
+
+TEST_F(BinOpenerTest, DoesNotWaitForEver) {
+    const BinOpening first = Open();
+    const BinOpening second = OpenAndLockBin(
+        SharePath(), true, [this] { ++waits; }, std::chrono::milliseconds(1));
+    EXPECT_EQ(waits, 1);
+    EXPECT_FALSE(second.bin.has_value());
+    EXPECT_FALSE(second.noBin);
+    EXPECT_EQ(second.problem, "another process has held the recycle bin for 1 second");
 }
 
 TEST_F(BinOpenerTest, OpensTheNewBinWhenTheOldOneWasReplacedWhileWaiting) {

@@ -114,6 +114,14 @@ TEST_F(RunStoreTest, TheLatestRunOfEachTaskComesInTheOrderOfTheTasks) {
     EXPECT_THAT(Runs()->Latest({}), IsEmpty());
 }
 
+TEST_F(RunStoreTest, TheRunThatGoesOnIsTheLatestWhateverWasSkippedForIt) {
+    AddRun("task, state", "1, 'ended'");
+    AddRun("task, state", "1, 'running'");
+    AddRun("task, state", "1, 'skipped'");
+    AddRun("task, state", "2, 'skipped'");
+    EXPECT_THAT(Ids(Runs()->Latest({1, 2})), ElementsAre(2, 4));
+}
+
 TEST_F(RunStoreTest, OutputIsGivenByteForByte) {
     AddRun();
     AddRun();

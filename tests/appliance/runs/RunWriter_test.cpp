@@ -10,7 +10,6 @@
 
 namespace {
 
-using orva::Database;
 using orva::RunReason;
 using orva::RunState;
 using orva::TaskStore;
@@ -35,6 +34,17 @@ class RunWriterTest : public RunTest {
     static std::optional<std::int64_t> Insert(const orva::ScheduledRun& run) {
         return InTransaction([&](orva::Connection& connection) {
             return orva::InsertRun(connection, run, absl::FromUnixMillis(kNoon * 1000 + 7));
+        });
+    }
+
+    // How many starts of the task are known.
+    static std::int64_t Known(int task) {
+        return InTransaction([task](orva::Connection& connection) {
+            orva::Query query =
+                connection.Prepare("SELECT count(*) FROM recorded_start WHERE task = ?");
+            query->bind(1, task);
+            query->executeStep();
+            return query->getColumn(0).getInt64();
         });
     }
 
@@ -63,6 +73,60 @@ TEST_F(RunWriterTest, AStartIsRecordedOnceForItsTaskAndInstant) {
     EXPECT_EQ(skipped.state, RunState::kSkipped);
     EXPECT_EQ(skipped.why, "overlap");
     EXPECT_EQ(skipped.reason, RunReason::kMissed);
+}
+
+TEST_F(RunWriterTest, OnlyASkippedStartCanStillBeMade) {
+    ASSERT_TRUE(Insert({1, "a", kNoon, RunReason::kSchedule, "missed"}));
+    EXPECT_EQ(Insert({1, "a", kNoon, RunReason::kSchedule, "overlap"}), std::nullopt);
+    EXPECT_TRUE(Insert({1, "a", kNoon, RunReason::kSchedule, ""}));
+    for (const char* state : {"queued", "running", "ended", "lost"}) {
+        Execute("UPDATE run SET state = '" + std::string(state) + "'");
+        EXPECT_EQ(Insert({1, "a", kNoon, RunReason::kSchedule, ""}), std::nullopt);
+    }
+    EXPECT_EQ(Runs()->List({}, 0, 0).total, 1);
+}
+
+TEST_F(RunWriterTest, AStartIsKnownWhenItsRunIsGone) {
+    ASSERT_TRUE(Insert({1, "a", kNoon, RunReason::kSchedule, ""}));
+    Execute("DELETE FROM run");
+    EXPECT_EQ(Insert({1, "a", kNoon, RunReason::kSchedule, ""}), std::nullopt);
+}
+
+constexpr std::int64_t kDay = 86'400;
+
+TEST_F(RunWriterTest, OfAThousandStartsTheOldestIsForgottenAfterNinetyDays) {
+    Execute(
+        "WITH RECURSIVE minute(n) AS (SELECT 0 UNION ALL SELECT n + 1 FROM minute WHERE n < 1000) "
+        "INSERT INTO recorded_start SELECT 1, 1777636800 + n * 60 FROM minute");
+    ASSERT_TRUE(Insert({2, "b", kNoon, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(1), 1001);
+    ASSERT_TRUE(Insert({1, "a", kNoon + 90 * kDay, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(1), 1002);
+    ASSERT_TRUE(Insert({1, "a", kNoon + 91 * kDay, RunReason::kSchedule, ""}));
+    ASSERT_TRUE(Insert({1, "a", kNoon + 92 * kDay, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(1), 1002);
+    EXPECT_EQ(Insert({1, "a", kNoon + 120, RunReason::kSchedule, ""}), std::nullopt);
+    EXPECT_TRUE(Insert({1, "a", kNoon + 60, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(2), 1);
+}
+
+TEST_F(RunWriterTest, AThousandStartsAreKnownHoweverOld) {
+    Execute(
+        "WITH RECURSIVE minute(n) AS (SELECT 0 UNION ALL SELECT n + 1 FROM minute WHERE n < 998) "
+        "INSERT INTO recorded_start SELECT 1, 1777636800 + n * 60 FROM minute");
+    ASSERT_TRUE(Insert({1, "a", kNoon + 365 * kDay, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(1), 1000);
+    ASSERT_TRUE(Insert({1, "a", kNoon + 366 * kDay, RunReason::kSchedule, ""}));
+    EXPECT_EQ(Known(1), 1000);
+}
+
+TEST_F(RunWriterTest, WithATaskItsStartsAreForgotten) {
+    const int task = TaskStore::Current()->Save(SampleTask("a"));
+    ASSERT_TRUE(Insert({task, "a", kNoon, RunReason::kSchedule, "overlap"}));
+    ASSERT_TRUE(Insert({task + 1, "b", kNoon, RunReason::kSchedule, "overlap"}));
+    TaskStore::Current()->Remove(task);
+    EXPECT_EQ(Known(task), 0);
+    EXPECT_EQ(Known(task + 1), 1);
 }
 
 TEST_F(RunWriterTest, RunsByHandAreRecordedAsOftenAsTheyAreAskedFor) {

@@ -1,6 +1,8 @@
 #include "appliance/scheduler/RuntimeFiles.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <grp.h>
 #include <poll.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -45,14 +47,65 @@ TEST_F(RuntimeFilesTest, ASecondSchedulerIsRefusedAndLearnsOfTheFirst) {
                          ") is running for root " + RootPath() + "; this one does not start");
 }
 
-TEST_F(RuntimeFilesTest, EverybodyMayAskWhetherASchedulerIsRunning) {
+// The account that whoever is not trusted stands for, and a group that is not this process's.
+constexpr uid_t kStranger = 65534;
+constexpr gid_t kOtherGroup = 12345;
+
+struct stat LockStatus(const std::string& root) {
+    struct stat status {};
+    EXPECT_EQ(::stat((root + "/run/orva/schedd.lock").c_str(), &status), 0);
+    return status;
+}
+
+TEST_F(RuntimeFilesTest, OnlyAccountAndGroupOfTheStoreMayAskWhetherASchedulerIsRunning) {
+    MakeDirectory("/usr/orva/var");
+    const bool isRoot = ::geteuid() == 0;
+    const gid_t group = isRoot ? kOtherGroup : ::getegid();
+    ASSERT_EQ(::chown((RootPath() + "/usr/orva/var").c_str(), static_cast<uid_t>(-1), group), 0);
     std::string error;
     const mode_t mask = ::umask(0077);
     const FileDescriptor lock = LockAsScheduler(error);
     ::umask(mask);
-    struct stat status {};
-    ASSERT_EQ(::stat((RootPath() + "/run/orva/schedd.lock").c_str(), &status), 0);
-    EXPECT_EQ(status.st_mode & 07777, 0644U);
+    ASSERT_TRUE(lock.IsOpen()) << error;
+    EXPECT_EQ(LockStatus(RootPath()).st_mode & 07777, 0640U);
+    EXPECT_EQ(LockStatus(RootPath()).st_gid, group);
+}
+
+TEST_F(RuntimeFilesTest, ALockThatEverybodyCouldReadIsPutRight) {
+    MakeDirectory("/usr/orva/var");
+    Write("/run/orva/schedd.lock", "");
+    ASSERT_EQ(::chmod((RootPath() + "/run/orva/schedd.lock").c_str(), 0644), 0);
+    std::string error;
+    ASSERT_TRUE(LockAsScheduler(error).IsOpen()) << error;
+    EXPECT_EQ(LockStatus(RootPath()).st_mode & 07777, 0640U);
+}
+
+// In a process of its own, as another account where this one may become one; otherwise by a file
+// that not even its owner may open.
+TEST_F(RuntimeFilesTest, WhoeverMayNotOpenTheLockCannotHoldItAndFindsNoScheduler) {
+    MakeDirectory("/usr/orva/var");
+    std::string error;
+    FileDescriptor lock = LockAsScheduler(error);
+    ASSERT_TRUE(lock.IsOpen()) << error;
+    const std::string path = RootPath() + "/run/orva/schedd.lock";
+    ASSERT_EQ(::chmod(RootPath().c_str(), 0755), 0);
+    const bool isRoot = ::geteuid() == 0;
+    if (!isRoot) {
+        ASSERT_EQ(::chmod(path.c_str(), 0), 0);
+    }
+    const pid_t child = ::fork();
+    if (child == 0) {
+        if (isRoot && (::setgroups(0, nullptr) != 0 || ::setgid(kStranger) != 0 ||
+                       ::setuid(kStranger) != 0)) {
+            ::_exit(2);
+        }
+        const FileDescriptor opened(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+        ::_exit(opened.IsOpen() || SchedulerLink::IsAlive() ? 1 : 0);
+    }
+    int status = 0;
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0);
 }
 
 TEST_F(RuntimeFilesTest, ARootThatDoesNotExistIsNotMade) {

@@ -1,4 +1,4 @@
-// Clocks that jump, ends in the middle of a step, a store that fails.
+// Ends in the middle of a step, a store that fails or is damaged.
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <gmock/gmock.h>
 
@@ -13,7 +13,6 @@ namespace {
 
 using testing::ElementsAre;
 using testing::IsEmpty;
-using testing::SizeIs;
 
 using SchedulerFaultsTest = SchedulerTest;
 
@@ -21,114 +20,6 @@ constexpr std::uint16_t kTogether = orva::kCanRunAppSameTime | orva::kCanRunTask
 
 // What a kill is to the scheduler's own steps.
 struct Killed : std::exception {};
-
-TEST_F(SchedulerFaultsTest, AClockPutBackAnHourStartsNothingTwice) {
-    orva::TaskData task = SampleTask("a");
-    task.flags |= kTogether;
-    task.schedule.intervalMinutes = 20;
-    task.schedule.firstMinute = 0;
-    const int id = AddTask(task);
-    for (const char* now : {"2026-05-01 12:20:00", "2026-05-01 12:40:00", "2026-05-01 13:00:00"}) {
-        SetNow(now);
-        Work();
-    }
-    EXPECT_EQ(host.started.size(), 3U);
-    SetNow("2026-05-01 12:10:00");
-    scheduler->ClockWasSet();
-    Work();
-    EXPECT_EQ(NextStart(id), "05-01 12:20");
-    for (const char* now : {"2026-05-01 12:20:00", "2026-05-01 12:40:00", "2026-05-01 13:00:00"}) {
-        SetNow(now);
-        Work();
-    }
-    EXPECT_EQ(host.started.size(), 3U);
-    SetNow("2026-05-01 13:20:00");
-    Work();
-    EXPECT_EQ(host.started.size(), 4U);
-    EXPECT_THAT(History(), SizeIs(4));
-}
-
-TEST_F(SchedulerFaultsTest, AClockPutForwardADayRecordsWhatItJumpedOver) {
-    AddTask("plain", 18, 0, kTogether);
-    orva::TaskData task = SampleTask("made up for");
-    task.flags |= kTogether;
-    task.schedule.firstMinute = 19 * 60;
-    task.schedule.runMissed = true;
-    AddTask(task);
-    SetNow("2026-05-02 12:00:00");
-    scheduler->ClockWasSet();
-    EXPECT_EQ(Work(), Utc("2026-05-02 18:00:00"));
-    EXPECT_THAT(History(), ElementsAre("plain 05-01 18:00 schedule skipped missed",
-                                       "made up for 05-01 19:00 missed running -"));
-}
-
-TEST_F(SchedulerFaultsTest, AfterAMistakenYearNextStartsAreThoseOfTheRightOne) {
-    const int id = AddTask("a", 18, 0, kTogether);
-    SetNow("2027-05-01 12:00:00");
-    scheduler->ClockWasSet();
-    Work();
-    EXPECT_EQ(NextStart(id), "05-01 18:00");
-    SetNow("2026-05-01 13:00:00");
-    scheduler->ClockWasSet();
-    EXPECT_EQ(Work(), Utc("2026-05-01 18:00:00"));
-    SetNow("2026-05-01 18:00:00");
-    Work();
-    EXPECT_THAT(Started(), ElementsAre("a"));
-}
-
-TEST_F(SchedulerFaultsTest, AClockThatStandsBeforeTheProgramWasMadeStartsNothing) {
-    options.programMade = Utc("2026-04-01 00:00:00");
-    SetNow("2000-01-01 00:00:00");
-    RestartAndRecover();
-    const int id = AddTask("a", 0, 1);
-    SetNow("2000-01-01 00:01:00");
-    Work();
-    EXPECT_THAT(Started(), IsEmpty());
-    EXPECT_THAT(History(), ElementsAre("a 01-01 00:01 schedule skipped clock not trusted"));
-    // A time service has asked around by now.
-    SetNow("2026-05-01 12:00:00");
-    scheduler->ClockWasSet();
-    EXPECT_EQ(Work(), Utc("2026-05-02 00:01:00"));
-    SetNow("2026-05-02 00:01:00");
-    Work();
-    EXPECT_THAT(Started(), ElementsAre("a"));
-    EXPECT_EQ(NextStart(id), "05-03 00:01");
-}
-
-TEST_F(SchedulerFaultsTest, AClockThatStandsADayBeforeTheHistoryStartsNothing) {
-    AddTask("a", 12, 30);
-    SetNow("2026-05-01 12:30:00");
-    Work();
-    End(1);
-    Work();
-    SetNow("2026-04-28 12:00:00");
-    RestartAndRecover();
-    AddTask("b", 12, 30);
-    SetNow("2026-04-28 12:30:00");
-    Work();
-    EXPECT_THAT(Started(), ElementsAre("a"));
-    EXPECT_THAT(History(), ElementsAre("a 05-01 12:30 schedule ended -",
-                                       "b 04-28 12:30 schedule skipped clock not trusted"));
-}
-
-TEST_F(SchedulerFaultsTest, AChangedTimeZoneMovesTheStartsToItsOwnTimes) {
-    const int id = AddTask("a", 18, 0);
-    Work();
-    EXPECT_EQ(NextStart(id), "05-01 18:00");
-    ::setenv("TZ", "Europe/Berlin", 1);
-    EXPECT_EQ(Work(), Utc("2026-05-01 16:00:00"));
-    EXPECT_EQ(NextStart(id), "05-01 16:00");
-    ::setenv("TZ", "UTC", 1);
-}
-
-TEST_F(SchedulerFaultsTest, AZoneThatChangedWhileNoSchedulerRanIsNoticedAtTheStart) {
-    const int id = AddTask("a", 18, 0);
-    ::setenv("TZ", "Europe/Berlin", 1);
-    RestartAndRecover();
-    EXPECT_EQ(Work(), Utc("2026-05-01 16:00:00"));
-    EXPECT_EQ(NextStart(id), "05-01 16:00");
-    ::setenv("TZ", "UTC", 1);
-}
 
 TEST_F(SchedulerFaultsTest, WhatWasMissedWhileTheMachineWasOffIsRecordedAsThat) {
     AddTask("a", 18, 0);
@@ -321,6 +212,119 @@ TEST_F(SchedulerFaultsTest, WhatWaitsIsStillKnownAfterAFailureOfTheStore) {
     }
     Work();
     EXPECT_THAT(Started(), ElementsAre("a", "b"));
+}
+
+TEST_F(SchedulerFaultsTest, RunsThatEndedTogetherWithTheDatabaseLockedAreInNobodysWay) {
+    Reopen(std::chrono::milliseconds(10));
+    scheduler = std::make_unique<orva::Scheduler>(*orva::TaskStore::Current(), host, options);
+    scheduler->Recover();
+    for (int count = 0; count < 40; ++count) {
+        orva::TaskData task = SampleTask("task " + std::to_string(count));
+        task.flags |= orva::kCanRunAppSameTime;
+        task.schedule.firstMinute = 0;
+        task.schedule.intervalMinutes = 1;
+        AddTask(task);
+    }
+    SetNow("2026-05-01 12:01:00");
+    Work();
+    ASSERT_EQ(host.started.size(), 40U);
+    for (std::int64_t run = 1; run <= 40; ++run) {
+        End(run);
+    }
+    SetNow("2026-05-01 12:02:00");
+    {
+        SQLite::Database other(DatabasePath(), SQLite::OPEN_READWRITE);
+        other.exec("BEGIN IMMEDIATE");
+        EXPECT_THROW(Work(), orva::StoreFailure);
+        other.exec("ROLLBACK");
+    }
+    Work();
+    EXPECT_EQ(host.started.size(), 80U);
+    EXPECT_EQ(orva::RunStore::Current()->List({{}, orva::RunState::kSkipped}, 0, 0).total, 0);
+}
+
+TEST_F(SchedulerFaultsTest, RunsThatEndedWhileNoSchedulerRanAreInNobodysWay) {
+    for (int count = 0; count < 40; ++count) {
+        orva::TaskData task = SampleTask("task " + std::to_string(count));
+        task.flags |= orva::kCanRunAppSameTime;
+        task.schedule.firstMinute = 0;
+        task.schedule.intervalMinutes = 1;
+        AddTask(task);
+    }
+    SetNow("2026-05-01 12:01:00");
+    Work();
+    ASSERT_EQ(host.started.size(), 40U);
+    host.goingOn.clear();
+    SetNow("2026-05-01 12:02:00");
+    RestartAndRecover();
+    Work();
+    EXPECT_EQ(host.started.size(), 80U);
+    EXPECT_EQ(orva::RunStore::Current()->List({{}, orva::RunState::kLost}, 0, 0).total, 40);
+}
+
+TEST_F(SchedulerFaultsTest, ADamagedTaskIsLeftOutAndTheOthersGoOn) {
+    const int damaged = AddTask("damaged", 12, 30, kTogether);
+    AddTask("a", 12, 30, kTogether);
+    Execute("UPDATE task SET first_minute = 99999 WHERE id = " + std::to_string(damaged));
+    SetNow("2026-05-01 12:30:00");
+    TakeLog();
+    EXPECT_EQ(Work(), Utc("2026-05-02 12:30:00"));
+    SetNow("2026-05-02 12:30:00");
+    Work();
+    scheduler->ClockWasSet();
+    RestartAndRecover();
+    Work();
+    EXPECT_THAT(TakeLog(), ElementsAre("task store " + DatabasePath() +
+                                       ": task 1: column first_minute holds 99999: it is not "
+                                       "started any more"));
+    EXPECT_THAT(Started(), ElementsAre("a", "a"));
+    EXPECT_EQ(NextStart(damaged), "-");
+}
+
+TEST_F(SchedulerFaultsTest, ATaskThatIsDamagedBeforeItsTimeDoesNotStopTheOthers) {
+    AddTask("a", 18, 0, kTogether);
+    const int damaged = AddTask("damaged", 18, 30, kTogether);
+    AddTask("b", 19, 0, kTogether);
+    Execute("UPDATE task SET date = 'never' WHERE id = " + std::to_string(damaged));
+    ::setenv("TZ", "Europe/Berlin", 1);
+    EXPECT_EQ(Work(), Utc("2026-05-01 16:00:00"));
+    ::setenv("TZ", "UTC", 1);
+    EXPECT_EQ(NextStart(damaged), "-");
+    EXPECT_EQ(NextStart(3), "05-01 17:00");
+}
+
+TEST_F(SchedulerFaultsTest, ANextStartThatIsNoNumberWakesNobody) {
+    const int damaged = AddTask("damaged", 12, 30, kTogether);
+    Work();
+    Execute("UPDATE task SET next_start = 'soon' WHERE id = " + std::to_string(damaged));
+    EXPECT_EQ(Work(), absl::InfiniteFuture());
+    RestartAndRecover();
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00"));
+}
+
+TEST_F(SchedulerFaultsTest, ANextStartFarBeforeAllTimeIsMissed) {
+    const int damaged = AddTask("a", 12, 30);
+    Execute("UPDATE task SET next_start = -9223372036854775808 WHERE id = " +
+            std::to_string(damaged));
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00"));
+    EXPECT_THAT(History(), ElementsAre("a 04-30 12:30 schedule skipped missed"));
+}
+
+TEST_F(SchedulerFaultsTest, ARunOfATaskThatIsDamagedMeanwhileEndsWithTheReason) {
+    options.mostRuns = 1;
+    RestartAndRecover();
+    AddTask("a", 12, 30, kTogether);
+    const int damaged = AddTask("b", 12, 30, kTogether);
+    AddTask("c", 12, 30, kTogether);
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    Execute("UPDATE task SET first_minute = 99999 WHERE id = " + std::to_string(damaged));
+    End(1);
+    Work();
+    EXPECT_THAT(Started(), ElementsAre("a", "c"));
+    EXPECT_THAT(History(), ElementsAre("a 05-01 12:30 schedule ended -",
+                                       "b 05-01 12:30 schedule ended its task is damaged",
+                                       "c 05-01 12:30 schedule running -"));
 }
 
 }  // namespace

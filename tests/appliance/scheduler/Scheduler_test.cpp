@@ -160,7 +160,7 @@ TEST_F(SchedulerTest, ATaskThatIsDisabledWhileItWaitsIsNotStarted) {
     EXPECT_EQ(NextStart(waiting), "-");
 }
 
-TEST_F(SchedulerTest, ATaskThatIsRemovedWhileItWaitsIsForgotten) {
+TEST_F(SchedulerTest, ATaskThatIsRemovedWhileItWaitsIsNotStarted) {
     options.mostRuns = 1;
     RestartAndRecover();
     AddTask("a", 12, 30, kTogether);
@@ -171,7 +171,8 @@ TEST_F(SchedulerTest, ATaskThatIsRemovedWhileItWaitsIsForgotten) {
     End(host.started[0].run);
     Work();
     EXPECT_THAT(Started(), ElementsAre("a"));
-    EXPECT_THAT(History(), ElementsAre("a 05-01 12:30 schedule ended -"));
+    EXPECT_THAT(History(), ElementsAre("a 05-01 12:30 schedule ended -",
+                                       "b 05-01 12:30 schedule skipped deleted"));
 }
 
 // The scheduler sleeps, or is not running, when both happen.
@@ -250,6 +251,25 @@ TEST_F(SchedulerTest, AHundredRunsOfATaskAreKeptAndOfOthersAll) {
     EXPECT_TRUE(runs->Find(4));
     EXPECT_FALSE(runs->Find(1));
     EXPECT_FALSE(runs->Output(1));
+}
+
+TEST_F(SchedulerTest, ATaskThatIsAskedForAgainAndAgainKeepsAHundredRuns) {
+    const int id = AddTask("a", 12, 30);
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    std::string rows;
+    for (int count = 0; count < 150; ++count) {
+        rows +=
+            "INSERT INTO run (task, task_name, reason, state, queued_at, asked_program, "
+            "asked_account) VALUES (" +
+            std::to_string(id) + ", 'a', 'hand', 'queued', 1777638600000, 'tester', 'root');";
+    }
+    Execute(rows);
+    Work();
+    const std::shared_ptr<orva::RunStore> runs = orva::RunStore::Current();
+    EXPECT_EQ(runs->List({id, orva::RunState::kSkipped}, 0, 0).total, 100);
+    // The one that goes on comes on top.
+    EXPECT_EQ(runs->List({id, {}}, 0, 0).total, 101);
 }
 
 TEST_F(SchedulerTest, RunsOlderThanNinetyDaysAreRemovedAFewAtATime) {

@@ -1,9 +1,11 @@
 #include <gmock/gmock.h>
 
 #include <fcntl.h>
+#include <pwd.h>
 #include <sys/file.h>
 #include <unistd.h>
 
+#include <filesystem>
 #include <memory>
 #include <string>
 
@@ -137,6 +139,52 @@ TEST_F(SchedTaskRecordsTest, ATaskThatNobodyOwnsCannotBeSavedAndTheLogSaysWhy) {
                 ElementsAre("task refused: basic.owner: is missing, and user id " +
                             std::to_string(::geteuid()) + " has no account to own the task"));
     EXPECT_EQ(orva::TaskStore::Current()->CurrentSnapshot()->Count(), 0U);
+}
+
+std::string OwnerOfANewRecord() {
+    const Record task;
+    return task.Get()->Data().owner;
+}
+
+TEST_F(SchedTaskRecordsTest, ANewTaskBelongsToTheAccountOfTheStoresFolder) {
+    const std::string folder = RootPath() + "/usr/orva/var";
+    std::filesystem::remove_all(folder);
+    EXPECT_EQ(OwnerOfANewRecord(), orva::OwnAccount());
+    MakeDirectory("/usr/orva/var");
+    EXPECT_EQ(OwnerOfANewRecord(), orva::OwnAccount());
+    if (::geteuid() == 0) {
+        const passwd* const other = ::getpwnam("daemon");
+        ASSERT_NE(other, nullptr);
+        ASSERT_EQ(::chown(folder.c_str(), other->pw_uid, static_cast<gid_t>(-1)), 0);
+        EXPECT_EQ(OwnerOfANewRecord(), "daemon");
+        // An account without a name owns no task.
+        ASSERT_EQ(::chown(folder.c_str(), 4000000001U, static_cast<gid_t>(-1)), 0);
+        EXPECT_EQ(OwnerOfANewRecord(), "root");
+    }
+}
+
+TEST_F(SchedTaskRecordsTest, ACommandThatNoShellCouldBeGivenIsRefused) {
+    const int id = SaveSample("a");
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    ORVASchedCTaskSetCommand(task.Get(), std::string(131'071, 'x').c_str());
+    EXPECT_EQ(ORVASchedTaskSave(task.Get()), 0);
+    ORVASchedCTaskSetCommand(task.Get(), std::string(131'072, 'x').c_str());
+    TakeLog();
+    EXPECT_LT(ORVASchedTaskSave(task.Get()), 0);
+    EXPECT_EQ(QLIBCErrGet(), orva::kErrBadArgument);
+    EXPECT_THAT(TakeLog(), ElementsAre("task refused: command: is longer than 131071 bytes"));
+    EXPECT_EQ(orva::TaskStore::Current()->Find(id)->command.size(), 131'071U);
+}
+
+TEST_F(SchedTaskRecordsTest, ATaskWithATooLongCommandFromBeforeCanBeSwitchedOff) {
+    orva::TaskData stored = SampleTask("a");
+    stored.command.assign(200'000, 'x');
+    const int id = orva::TaskStore::Current()->Save(stored);
+    const Record task;
+    ASSERT_EQ(ORVASchedTaskLoad(id, task.Get()), 0);
+    ORVASchedCTaskSetState(task.Get(), false);
+    EXPECT_EQ(ORVASchedTaskSave(task.Get()), 0);
 }
 
 TEST_F(SchedTaskRecordsTest, LoadingMinusOneGivesANewRecord) {

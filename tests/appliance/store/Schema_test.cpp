@@ -94,13 +94,26 @@ TEST_F(SchemaTest, AFileOfTheFirstVersionKeepsItsTasksAndQueuedRuns) {
     const orva::SharedTask task = TaskStore::Current()->Find(3);
     ASSERT_NE(task, nullptr);
     EXPECT_EQ(task->name, "nightly");
-    EXPECT_THAT(Rows("PRAGMA user_version"), ElementsAre("2"));
+    EXPECT_THAT(Rows("PRAGMA user_version"), ElementsAre("3"));
     EXPECT_THAT(
         Rows("SELECT id || ' ' || task || ' ' || task_name || ' ' || reason || ' ' || state "
              "|| ' ' || queued_at || ' ' || asked_program FROM run ORDER BY id"),
         ElementsAre("1 3 nightly hand queued 1777636800000 orva-webapid",
                     "5 8  hand queued 1777636802000 "));
     EXPECT_THAT(Rows("PRAGMA integrity_check"), ElementsAre("ok"));
+}
+
+TEST_F(SchemaTest, StartsThatAnOlderFileHasOnRecordAreKnown) {
+    WriteFirstVersion();
+    SQLite::Database(DatabasePath(), SQLite::OPEN_READWRITE)
+        .exec(
+            "INSERT INTO run (task, occurrence, reason, state, queued_at, asked_program, "
+            "asked_account) VALUES (3, 1777617000, 'schedule', 'queued', 1777617000, '', ''), "
+            "(8, 1777617000, 'schedule', 'queued', 1777617000, '', '')");
+    TaskStore::Current()->CurrentSnapshot();
+    // Task 8 is gone.
+    EXPECT_THAT(Rows("SELECT task || ' ' || occurrence FROM recorded_start"),
+                ElementsAre("3 1777617000"));
 }
 
 TEST_F(SchemaTest, IdsOfTheFirstVersionAreNotGivenAgain) {

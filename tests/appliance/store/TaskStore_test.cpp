@@ -291,7 +291,7 @@ TEST_F(TaskStoreTest, ARunIsQueuedOnlyWhileASchedulerIsAlive) {
     EXPECT_EQ(Stored("SELECT task_name FROM run"), "a");
 }
 
-TEST_F(TaskStoreTest, ARemovedTaskTakesItsQueuedRunsAlong) {
+TEST_F(TaskStoreTest, TheQueuedRunsOfARemovedTaskAreSkipped) {
     TaskStore& store = *TaskStore::Current();
     store.Save(SampleTask("a"));
     {
@@ -302,7 +302,8 @@ TEST_F(TaskStoreTest, ARemovedTaskTakesItsQueuedRunsAlong) {
             "(1, 'hand', 'ended', 0, '', '')");
     }
     store.Remove(1);
-    EXPECT_EQ(Stored("SELECT group_concat(state) FROM run"), "ended");
+    EXPECT_EQ(Stored("SELECT group_concat(state || ' ' || why, ',') FROM run"),
+              "skipped deleted,ended ");
 }
 
 TEST_F(TaskStoreTest, ARunThatChangesLeavesTheSnapshotOfTheTasksAsItIs) {

@@ -171,6 +171,8 @@ TEST_F(TaskTransferTest, TheFirstBadMemberIsNamedAndNothingIsStored) {
               "task 3: schedule.hour: is no integer from 0 to 23");
     EXPECT_EQ(Problem(ThirdTask(good, R"(,"schedule":7)")), "task 3: schedule: is no object");
     EXPECT_EQ(Problem(ThirdTask(good, R"(,"command":["a"])")), "task 3: command: is no text");
+    EXPECT_EQ(Problem(ThirdTask(good, ",\"command\":\"" + std::string(131'072, 'x') + "\"")),
+              "task 3: command: is longer than 131071 bytes");
     EXPECT_EQ(Problem(ThirdTask(good, R"(,"listable":"yes")")),
               "task 3: listable: is neither true nor false");
 }

@@ -3,10 +3,12 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
 
 #include "tests/appliance/util/Sandbox.h"
@@ -147,7 +149,8 @@ TEST_F(RunFolderTest, SignalsTheCommandsGroupOnlyWhileItRuns) {
     char byte = 0;
     ASSERT_EQ(::read(ready[0], &byte, 1), 1);
     Write("/usr/orva/var/runs/7/process",
-          orva::SupervisorRecords({orva::BootId(), ::getpid(), 1, 0}) + orva::CommandRecord(child));
+          orva::SupervisorRecords({orva::BootId(), ::getpid(), 1, 0}) +
+              orva::CommandRecords(child, 0));
 
     Write("/usr/orva/var/runs/7/ending", "ended=1\0why=\0end=\0"s);
     EXPECT_FALSE(folder.SignalCommand(SIGTERM));
@@ -160,6 +163,95 @@ TEST_F(RunFolderTest, SignalsTheCommandsGroupOnlyWhileItRuns) {
     EXPECT_FALSE(folder.SignalCommand(SIGTERM));
     ::close(ready[0]);
     ::close(ready[1]);
+}
+
+TEST_F(RunFolderTest, TellsHowFarItsRunHasCome) {
+    using State = orva::RunFolder::State;
+    const orva::RunFolder folder(7);
+    EXPECT_EQ(folder.Look(), State::kNotBegun);
+    orva::FileDescriptor lock = Create(folder);
+    EXPECT_EQ(folder.Look(), State::kSupervised);
+    lock = orva::FileDescriptor();
+    EXPECT_EQ(folder.Look(), State::kNotBegun);
+    Write("/usr/orva/var/runs/7/process", orva::SupervisorRecords({"boot", 17, 4711, 0}));
+    EXPECT_EQ(folder.Look(), State::kAbandoned);
+    Write("/usr/orva/var/runs/7/ending", "ended=1\0why=\0end=\0"s);
+    EXPECT_EQ(folder.Look(), State::kEnded);
+}
+
+TEST_F(RunFolderTest, WithoutAFileDescriptorNobodyKnowsHowFarItsRunHasCome) {
+    const orva::RunFolder folder(7);
+    const orva::FileDescriptor lock = Create(folder);
+    rlimit usual{};
+    ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &usual), 0);
+    const rlimit none{0, usual.rlim_max};
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
+    const orva::RunFolder::State state = folder.Look();
+    const int why = errno;
+    ::setrlimit(RLIMIT_NOFILE, &usual);
+    EXPECT_EQ(state, orva::RunFolder::State::kUnknown);
+    EXPECT_EQ(why, EMFILE);
+}
+
+TEST_F(RunFolderTest, AProcessFileThatCannotBeOpenedSaysNothingAboutItsRun) {
+    const orva::RunFolder folder(7);
+    const orva::FileDescriptor lock = Create(folder);
+    std::filesystem::remove(folder.Path() + "/process");
+    std::filesystem::create_symlink("process", folder.Path() + "/process");
+    EXPECT_EQ(folder.Look(), orva::RunFolder::State::kUnknown);
+    EXPECT_EQ(errno, ELOOP);
+}
+
+TEST_F(RunFolderTest, HoldsTheTimeAtWhichAStoppedCommandIsKilled) {
+    const orva::RunFolder folder(7);
+    EXPECT_FALSE(folder.RecordStop(1));
+    const orva::FileDescriptor lock = Create(folder);
+    EXPECT_TRUE(folder.RecordStop(123'456'789));
+    EXPECT_EQ(Read("/usr/orva/var/runs/7/process"), "killAt=123456789\0"s);
+}
+
+TEST_F(RunFolderTest, KillsAnAbandonedCommandOnlyWhenItIsCertainlyTheSame) {
+    const orva::RunFolder folder(7);
+    orva::FileDescriptor lock = Create(folder);
+    int ready[2];
+    ASSERT_EQ(::pipe2(ready, O_CLOEXEC), 0);
+    const pid_t child = ::fork();
+    if (child == 0) {
+        lock = orva::FileDescriptor();
+        ::setpgid(0, 0);
+        static_cast<void>(::write(ready[1], "r", 1));
+        ::pause();
+        ::_exit(0);
+    }
+    char byte = 0;
+    ASSERT_EQ(::read(ready[0], &byte, 1), 1);
+    ::close(ready[0]);
+    ::close(ready[1]);
+    const std::uint64_t start = orva::ProcessStart(child).value_or(0);
+    const auto record = [&](const std::string& bootId, std::uint64_t commandStart) {
+        Write("/usr/orva/var/runs/7/process", orva::SupervisorRecords({bootId, 17, 4711, 0}) +
+                                                  orva::CommandRecords(child, commandStart));
+    };
+    record(orva::BootId(), start);
+    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
+    lock = orva::FileDescriptor();
+    record(orva::BootId(), start - 1);
+    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
+    record(orva::BootId(), 0);
+    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
+    record("00000000-0000-0000-0000-000000000000", start);
+    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
+    EXPECT_EQ(::waitpid(child, nullptr, WNOHANG), 0);
+
+    record(orva::BootId(), start);
+    const orva::FileDescriptor shell = folder.KillAbandonedCommand();
+    ASSERT_TRUE(shell.IsOpen());
+    pollfd ended{shell.Get(), POLLIN, 0};
+    EXPECT_EQ(::poll(&ended, 1, 60'000), 1);
+    int status = 0;
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL);
+    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
 }
 
 TEST_F(RunFolderTest, ReplacesWhatStandsThereAlready) {

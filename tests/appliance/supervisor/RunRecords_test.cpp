@@ -62,11 +62,23 @@ TEST(RunRecordsTest, AProcessIsKnownBeforeItsCommandIs) {
     const std::string records = orva::SupervisorRecords(process);
     EXPECT_EQ(records, "boot=boot\0start=4711\0supervisor=17\0"s);
     EXPECT_EQ(orva::ProcessFromRecords(records), process);
-    EXPECT_EQ(orva::ProcessFromRecords(records + orva::CommandRecord(18)),
-              (orva::RunProcess{"boot", 17, 4711, 18}));
+    EXPECT_EQ(orva::CommandRecords(18, 4712), "commandStart=4712\0command=18\0"s);
+    EXPECT_EQ(orva::ProcessFromRecords(records + orva::CommandRecords(18, 4712)),
+              (orva::RunProcess{"boot", 17, 4711, 18, 4712}));
     EXPECT_EQ(orva::ProcessFromRecords(records + "comm"), process);
     EXPECT_FALSE(orva::ProcessFromRecords(records.substr(0, records.size() - 1)));
     EXPECT_FALSE(orva::ProcessFromRecords(""));
+}
+
+TEST(RunRecordsTest, AStopIsReadWhereverItStandsAmongAProcesssRecords) {
+    const std::string records = orva::SupervisorRecords({"boot", 17, 4711, 0});
+    EXPECT_EQ(orva::StopRecord(123'456'789), "killAt=123456789\0"s);
+    EXPECT_EQ(orva::ProcessFromRecords(orva::StopRecord(5) + records),
+              (orva::RunProcess{"boot", 17, 4711, 0, 0, 5}));
+    EXPECT_EQ(
+        orva::ProcessFromRecords(records + orva::StopRecord(5) + orva::CommandRecords(18, 4712)),
+        (orva::RunProcess{"boot", 17, 4711, 18, 4712, 5}));
+    EXPECT_FALSE(orva::ProcessFromRecords(orva::StopRecord(5)));
 }
 
 TEST(RunRecordsTest, TellsWhenAProcessWasStarted) {

@@ -75,7 +75,10 @@ export function SignInForm({ onSignedIn, notice }: Props) {
                 />
                 <FormHelperText>
                     <HelperText id="token-help" aria-live="polite">
-                        <HelperTextItem variant={problem ? 'error' : 'default'}>
+                        <HelperTextItem
+                            variant={problem ? 'error' : 'default'}
+                            screenReaderText=""
+                        >
                             {problem || t('signin.help')}
                         </HelperTextItem>
                     </HelperText>

@@ -32,10 +32,41 @@ const listeners = new Set<() => void>();
 let guard: Guard | null = null;
 let current = window.location.hash;
 
+/** What an entry of the browser's history keeps: its place there, and the address it was opened from. */
+interface Entry {
+    place: number;
+    from: string | null;
+}
+
+function entry(): Entry | null {
+    return history.state as Entry | null;
+}
+
+/** A new entry knows nothing yet; it follows the one that was shown. */
+function nameEntry(place: number, from: string | null): Entry {
+    const known = entry();
+    if (known) {
+        return known;
+    }
+    const fresh = { place, from };
+    history.replaceState(fresh, '');
+    return fresh;
+}
+
+/** The place of the entry that is shown. */
+let { place } = nameEntry(0, null);
+
 function follow(): void {
     current = window.location.hash;
     listeners.forEach((listener) => listener());
 }
+
+// Two neighbours with the same address differ in their place only.
+window.addEventListener('popstate', () => {
+    if (window.location.hash === current) {
+        ({ place } = nameEntry(place + 1, current));
+    }
+});
 
 window.addEventListener('hashchange', () => {
     const wanted = window.location.hash;
@@ -47,15 +78,17 @@ window.addEventListener('hashchange', () => {
         window.location.reload();
         return;
     }
-    if (guard) {
-        // Shown where it was until the guard says otherwise.
-        history.replaceState(null, '', current || '#/');
+    const steps = nameEntry(place + 1, current).place - place;
+    if (guard && steps !== 0) {
+        // Back to where it was until the guard says otherwise; every entry stays what it is.
+        history.go(-steps);
         guard(() => {
             guard = null;
-            window.location.hash = wanted;
+            history.go(steps);
         });
         return;
     }
+    place += steps;
     follow();
 });
 
@@ -70,8 +103,22 @@ export function go(target: string): void {
 /** Replaces the address without a step to go back to. */
 export function replace(target: string): void {
     if (target !== window.location.hash) {
-        history.replaceState(null, '', target);
+        history.replaceState(entry(), '', target);
         follow();
+    }
+}
+
+/** Leaves a view for `target`: back, when it was opened from there, or else in its stead. */
+export function close(target: string): void {
+    if (entry()?.from === target) {
+        history.back();
+    } else if (guard) {
+        guard(() => {
+            guard = null;
+            replace(target);
+        });
+    } else {
+        replace(target);
     }
 }
 

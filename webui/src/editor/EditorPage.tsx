@@ -1,11 +1,13 @@
-import { Title } from '@patternfly/react-core';
+import { Button, Title } from '@patternfly/react-core';
 import { useEffect, useState } from 'react';
 
 import { ApiError } from '../api/client';
 import { blankTask, getTask, type TaskDocument } from '../api/tasks';
 import type { ViewProps } from '../app/CurrentView';
+import { close } from '../app/route';
 import { useQuery } from '../live/useQuery';
 import { kindName } from '../tasks/kinds';
+import { lastList } from '../tasks/lastList';
 import { useTexts } from '../texts/TextsProvider';
 import { Failed, Loading } from '../ui/states';
 import { asEditableKind } from './kinds/names';
@@ -49,7 +51,18 @@ export function EditorPage({ id, kind, onTitle }: Props) {
         if (key === null) {
             return <Failed title={t('editor.failed')} error={new Error(t('editor.unknownKind'))} />;
         }
-        const error = isMissing(query.error) ? new Error(t('editor.noTask')) : query.error;
+        if (isMissing(query.error)) {
+            return (
+                <Failed
+                    title={t('editor.failed')}
+                    error={new Error(t('editor.noTask'))}
+                    action={
+                        <Button onClick={() => close(lastList())}>{t('editor.back')}</Button>
+                    }
+                />
+            );
+        }
+        const { error } = query;
         return error ? <Failed title={t('editor.failed')} error={error} /> : <Loading />;
     }
     return (

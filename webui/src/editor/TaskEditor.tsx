@@ -12,7 +12,7 @@ import ExclamationCircleIcon from '@patternfly/react-icons/dist/esm/icons/exclam
 import { type FormEvent, useMemo, useState } from 'react';
 
 import type { TaskDocument } from '../api/tasks';
-import { go, setGuard } from '../app/route';
+import { close, setGuard } from '../app/route';
 import { lastList } from '../tasks/lastList';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
@@ -109,7 +109,7 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
                 setSaved(true);
                 setGuard(null);
                 toasts.say('success', t(isNew ? 'done.created' : 'done.saved', { name: form.name }));
-                go(lastList());
+                close(lastList());
             }
         } catch (error) {
             toasts.fail(t('failed.save'), error);
@@ -159,10 +159,10 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
                     ))}
                 </Tabs>
                 <ActionGroup className="orva-actions">
-                    <Button type="submit" isLoading={editor.busy} isDisabled={editor.busy}>
+                    <Button type="submit" isLoading={editor.busy} isDisabled={editor.busy || isGone}>
                         {t(isNew ? 'action.create' : 'action.save')}
                     </Button>
-                    <Button variant="link" onClick={() => go(lastList())}>
+                    <Button variant="link" onClick={() => close(lastList())}>
                         {t('action.cancel')}
                     </Button>
                 </ActionGroup>

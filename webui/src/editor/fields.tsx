@@ -43,7 +43,7 @@ export function FieldHelp({ field, help }: { field: string; help?: string | unde
         <FormHelperText>
             <HelperText id={`${fieldId(field)}-help`} aria-live="polite">
                 {(text ?? help) && (
-                    <HelperTextItem variant={text ? 'error' : 'default'}>
+                    <HelperTextItem variant={text ? 'error' : 'default'} screenReaderText="">
                         {text ?? help}
                     </HelperTextItem>
                 )}

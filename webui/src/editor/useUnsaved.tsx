@@ -33,7 +33,13 @@ export function useUnsaved(dirty: boolean): ReactNode {
                 <ModalHeader title={t('leave.title')} labelId="leave-title" />
                 <ModalBody>{t('leave.body')}</ModalBody>
                 <ModalFooter>
-                    <Button variant="danger" onClick={leave.goOn}>
+                    <Button
+                        variant="danger"
+                        onClick={() => {
+                            setLeave(null);
+                            leave.goOn();
+                        }}
+                    >
                         {t('leave.go')}
                     </Button>
                     <Button variant="link" onClick={() => setLeave(null)}>

@@ -11,6 +11,7 @@ import ListIcon from '@patternfly/react-icons/dist/esm/icons/list-icon';
 import { useEffect, useMemo } from 'react';
 
 import { listRuns, RUN_STATES } from '../api/history';
+import { getTask } from '../api/tasks';
 import type { ViewProps } from '../app/CurrentView';
 import { useRoute } from '../app/route';
 import { useQuery } from '../live/useQuery';
@@ -32,6 +33,18 @@ function useRuns(view: HistoryView) {
     return useQuery(JSON.stringify(query), (signal) => listRuns(query, signal));
 }
 
+/** What the title calls the task whose runs are shown; a task without any is asked for its name. */
+function useTaskName(task: number | null, nameOfRun: string | null): string | null {
+    const asked = useQuery(
+        task !== null && nameOfRun === null ? `name ${task}` : null,
+        (signal) => getTask(task ?? 0, signal),
+    );
+    if (task === null) {
+        return null;
+    }
+    return nameOfRun ?? (asked.data?.id === task ? asked.data.name : `${task}`);
+}
+
 function NoRuns({ filtered }: { filtered: boolean }) {
     const { t } = useTexts();
     return (
@@ -51,7 +64,7 @@ export function HistoryPage({ onTitle }: ViewProps) {
     const change = (part: Partial<HistoryView>) => showHistory({ ...view, ...part });
 
     const runs = data?.runs ?? [];
-    const name = view.task === null ? null : (runs[0]?.name ?? `${view.task}`);
+    const name = useTaskName(view.task, data && (runs[0]?.name ?? null));
     const title = name === null ? t('history.title') : t('history.titleOf', { name });
     useEffect(() => onTitle(title), [onTitle, title]);
 

@@ -38,6 +38,7 @@ export function resultText(run: Run, t: Translate): string {
 const REASONS: readonly [string, TextKey][] = [
     ['overlap', 'why.overlap'],
     ['disabled', 'why.disabled'],
+    ['deleted', 'why.deleted'],
     ['missed', 'why.missed'],
     ['machine off', 'why.machineOff'],
     ['clock not trusted', 'why.clock'],

@@ -133,6 +133,8 @@ export class Live {
         if (error instanceof ConnectionError) {
             this.update({ online: false });
         } else if (error instanceof SignedOutError) {
+            // An answer all the same.
+            this.update({ online: true });
             this.stop();
         } else if (!isAbort(error)) {
             this.answered(false);

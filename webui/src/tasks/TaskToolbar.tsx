@@ -79,7 +79,7 @@ export function TaskToolbar(props: Props) {
                     <ToolbarItem>
                         <SearchInput
                             aria-label={t('list.search')}
-                            placeholder={t('list.search')}
+                            placeholder={t('list.searchHint')}
                             value={view.text}
                             onChange={(_event, text) => onView({ text, page: 1 })}
                             onClear={() => onView({ text: '', page: 1 })}

@@ -6,6 +6,7 @@ let view: typeof import('./view');
 
 beforeAll(async () => {
     vi.stubGlobal('window', { location: { hash: '' }, addEventListener: () => undefined });
+    vi.stubGlobal('history', { state: { place: 0, from: null } });
     view = await import('./view');
 });
 

@@ -8,6 +8,7 @@ import {
     Spinner,
 } from '@patternfly/react-core';
 import ExclamationCircleIcon from '@patternfly/react-icons/dist/esm/icons/exclamation-circle-icon';
+import type { ReactNode } from 'react';
 
 import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
@@ -22,15 +23,22 @@ export function Loading() {
     );
 }
 
+interface FailedProps {
+    title: string;
+    error: Error;
+    /** What to do about it, when trying again does not help. */
+    action?: ReactNode;
+}
+
 /** Nothing could be read at all. */
-export function Failed({ title, error }: { title: string; error: Error }) {
+export function Failed({ title, error, action }: FailedProps) {
     const { t } = useTexts();
     return (
         <EmptyState titleText={title} headingLevel="h2" status="danger" icon={ExclamationCircleIcon}>
             <EmptyStateBody>{errorText(error, t)}</EmptyStateBody>
             <EmptyStateFooter>
                 <EmptyStateActions>
-                    <Button onClick={live.refresh}>{t('action.again')}</Button>
+                    {action ?? <Button onClick={live.refresh}>{t('action.again')}</Button>}
                 </EmptyStateActions>
             </EmptyStateFooter>
         </EmptyState>

@@ -1,4 +1,12 @@
-import { Button, Card, CardBody, CardTitle, ExpandableSection } from '@patternfly/react-core';
+import {
+    Button,
+    Card,
+    CardBody,
+    CardTitle,
+    ExpandableSection,
+    HelperText,
+    HelperTextItem,
+} from '@patternfly/react-core';
 import { Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import { useEffect, useRef, useState } from 'react';
 
@@ -143,10 +151,14 @@ export function Preview({ form, disabled }: { form: RecycleForm; disabled: boole
                     variant="secondary"
                     isDisabled={disabled || busy}
                     isLoading={busy}
+                    aria-describedby="preview-not-yet"
                     onClick={() => void look()}
                 >
                     {t('preview.look')}
                 </Button>
+                <HelperText id="preview-not-yet">
+                    {disabled && <HelperTextItem>{t('preview.notYet')}</HelperTextItem>}
+                </HelperText>
                 <div aria-live="polite">
                     {failure && <Notice isPlain variant="danger" title={failure} />}
                     {current && <Result preview={current} />}
