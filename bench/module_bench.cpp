@@ -173,7 +173,9 @@ void Delete_floor(benchmark::State& state) {
                           " date, first_minute, interval_minutes, last_minute, run_missed,"
                           " next_start FROM task WHERE id = 1");
     RawTransaction transaction(raw, {"DELETE FROM task WHERE id = ?",
-                                     "DELETE FROM run WHERE task = ? AND state = 'queued'"});
+                                     "UPDATE run SET state = 'skipped', why = 'deleted' "
+                                     "WHERE task = ? AND state = 'queued'",
+                                     "DELETE FROM recorded_start WHERE task = ?"});
     for (auto _ : state) {
         state.PauseTiming();
         add.exec();
