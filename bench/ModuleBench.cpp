@@ -11,6 +11,7 @@
 #include "appliance/root/Root.h"
 #include "appliance/store/TaskData.h"
 #include "appliance/store/TaskStore.h"
+#include "appliance/util/CallScope.h"
 #include "appliance/util/StrictJson.h"
 #include "appliance/webapi/JsonWriter.h"
 
@@ -77,8 +78,13 @@ std::filesystem::path BenchAppliance::Database() const { return root / "usr/orva
 int BenchAppliance::AddTask() const { return TaskStore::Current()->Save(MakeTask(0)); }
 
 ORVA::APIResponse BenchAppliance::Call(const char* method, const Json::Value& parameters) const {
-    ORVA::APIRequest request(parameters, "en");
+    ORVA::APIRequest request = Request(parameters);
+    return Call(method, request);
+}
+
+ORVA::APIResponse BenchAppliance::Call(const char* method, ORVA::APIRequest& request) const {
     ORVA::APIResponse response;
+    const CallScope scope;
     modules->Catalogue().Lookup(kApi, 1, method).function(&request, &response);
     if (!response.IsSuccess()) {
         Require(false, std::string(method) + ": " + WriteJson(response.GetDocument()));

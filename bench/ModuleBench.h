@@ -23,7 +23,12 @@ class BenchAppliance {
     BenchAppliance& operator=(const BenchAppliance&) = delete;
 
     // Calls a method of the task scheduler's API in this process; ends the program when it fails.
+    ORVA::APIResponse Call(const char* method, ORVA::APIRequest& request) const;
     ORVA::APIResponse Call(const char* method, const Json::Value& parameters) const;
+
+    // A request for any number of calls. The server does not copy the document that it has read, so
+    // neither should what is measured.
+    static ORVA::APIRequest Request(const Json::Value& parameters) { return {parameters, "en"}; }
 
     std::filesystem::path Root() const { return root; }
     std::filesystem::path Database() const;

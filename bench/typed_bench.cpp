@@ -104,8 +104,9 @@ class TypedAppliance {
         installed = count;
     }
 
-    ORVA::APIResponse Call(const char* method, const Json::Value& parameters) const {
-        return appliance.Call(method, parameters);
+    template <class Request>
+    ORVA::APIResponse Call(const char* method, Request&& request) const {
+        return appliance.Call(method, std::forward<Request>(request));
     }
 
     static Json::Value Id(int id) {
@@ -158,22 +159,23 @@ SQLite::Database& RawDatabase() {
 
 void Get(benchmark::State& state, const Kind& kind) {
     const TypedAppliance& appliance = Appliance();
-    const Json::Value parameters = TypedAppliance::Id(appliance.IdOf(kind));
+    ORVA::APIRequest request = BenchAppliance::Request(TypedAppliance::Id(appliance.IdOf(kind)));
     for (auto _ : state) {
-        benchmark::DoNotOptimize(appliance.Call("get", parameters));
+        benchmark::DoNotOptimize(appliance.Call("get", request));
     }
 }
 
 void Set(benchmark::State& state, const Kind& kind) {
     const TypedAppliance& appliance = Appliance();
-    std::array<Json::Value, 2> forms;
-    for (std::size_t which = 0; which < forms.size(); ++which) {
-        forms[which] = TypedAppliance::Form(kind, which);
-        forms[which]["id"] = appliance.IdOf(kind);
-    }
+    const auto request = [&](std::size_t which) {
+        Json::Value form = TypedAppliance::Form(kind, which);
+        form["id"] = appliance.IdOf(kind);
+        return BenchAppliance::Request(form);
+    };
+    std::array<ORVA::APIRequest, 2> requests = {request(0), request(1)};
     std::size_t round = 0;
     for (auto _ : state) {
-        benchmark::DoNotOptimize(appliance.Call("set", forms[++round % forms.size()]));
+        benchmark::DoNotOptimize(appliance.Call("set", requests[++round % requests.size()]));
     }
 }
 
@@ -181,8 +183,9 @@ void Create(benchmark::State& state, const Kind& kind) {
     const TypedAppliance& appliance = Appliance();
     Json::Value form = TypedAppliance::Form(kind, 0);
     form["type"] = kind.type;
+    ORVA::APIRequest request = BenchAppliance::Request(form);
     for (auto _ : state) {
-        benchmark::DoNotOptimize(appliance.Call("create", form));
+        benchmark::DoNotOptimize(appliance.Call("create", request));
     }
 }
 
@@ -195,7 +198,7 @@ constexpr const char* kRawUpdate =
 constexpr const char* kRawInsert =
     "INSERT INTO task SELECT NULL, flags, name, owner, app, app_name, app_args, action, command,"
     " edit_form, mode, repeat, week_days, date, first_minute, interval_minutes, last_minute,"
-    " run_missed, next_start FROM task WHERE id = ?";
+    " run_missed, next_start, schedule_since FROM task WHERE id = ?";
 
 void WriteFloor(benchmark::State& state, const Kind& kind, const char* sql) {
     RawTransaction transaction(RawDatabase(), {sql});

@@ -2,6 +2,7 @@
 
 #include <json/value.h>
 
+#include <memory>
 #include <string>
 
 #include "platform/texts.h"
@@ -31,7 +32,7 @@ class AppParser {
     ORVA::ZUM::JSConfigParser configParser;
     ORVA::ZUM::LocalizedStringParser textReader;
     Json::Value appTexts;
-    Json::Value commonTexts;
+    std::shared_ptr<const Json::Value> commonTexts;
 };
 
 }  // namespace ORVA::Core::TaskScheduler

@@ -1,4 +1,4 @@
-// Application sections as compact JSON text, in the form that task records have always held: the
+// Application sections as compact JSON text, in the form that task records hold: the
 // writer ends its text with a newline, the reader keeps comments. Both use jsoncpp's older reader
 // and writer, whose output stored tasks depend on.
 #pragma once

@@ -16,8 +16,9 @@ class TaskSchedulerRecycleHandler : public TaskSchedulerBasicHandler {
     bool ConvertToJson_App(const _tag_orva_sched_task_& task, Json::Value& document) override;
 
     // Writes the record and switches on the recycle bins that "enableRecycle" asks for. False, with
-    // a log line, for an unknown "recycle_action" and for a selection without usable share names;
-    // action and command are untouched then, the application arguments are already replaced.
+    // a log line, for an unknown "recycle_action", for a selection without usable share names and
+    // for a clean that is to keep extensions which are none; action, command and bins are untouched
+    // then, the application arguments are already replaced.
     bool ConvertFromJson_App(const Json::Value& document, _tag_orva_sched_task_& task) override;
 
     // Always true. Members that a damaged stored section lacks read as unset.

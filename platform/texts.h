@@ -6,6 +6,7 @@
 
 #include <json/value.h>
 
+#include <memory>
 #include <string>
 
 #include "platform/conf.h"
@@ -36,8 +37,9 @@ class LocalizedStringParser {
     // The texts of `directory`, an absolute path of the appliance: its file strings.json, an object
     // {section: {key: text}}. A section that is no object and a text that is no string are left
     // out, and one log line for each version of the file names the first of them. An empty object
-    // when the file is missing, is not JSON or is no object.
-    Json::Value ParseTexts(const std::string& directory) const;
+    // when the file is missing, is not JSON or is no object. Never null. Everybody who asks while
+    // the file stays the same shares one document.
+    std::shared_ptr<const Json::Value> ParseTexts(const std::string& directory) const;
 };
 
 }  // namespace ORVA::ZUM

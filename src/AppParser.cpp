@@ -49,10 +49,10 @@ std::string AppParser::GetString(const std::string& app, const std::string& text
     std::string result;
     if (const Json::Value* directory = FindMember(appTexts, app);
         directory != nullptr && directory->isString()) {
-        result = FindText(textReader.ParseTexts(kWebRoot + directory->asString()), section, key);
+        result = FindText(*textReader.ParseTexts(kWebRoot + directory->asString()), section, key);
     }
     if (result.empty()) {
-        result = FindText(commonTexts, section, key);
+        result = FindText(*commonTexts, section, key);
     }
     return result.empty() ? text : result;
 }

@@ -41,6 +41,11 @@ std::uint64_t Database::Generation() {
     return generation;
 }
 
+std::optional<uid_t> Database::FolderOwner() {
+    const std::lock_guard lock(mutex);
+    return folderOwner;
+}
+
 std::unique_ptr<Connection> Database::Open() {
     const std::lock_guard lock(mutex);
     CheckFile();
@@ -60,6 +65,7 @@ void Database::ForgetFile() {
     ++generation;
     openFile = {};
     directory = nullptr;
+    folderOwner = std::nullopt;
     const FileId formerLog = std::exchange(openLog, {});
     const std::string log = file + "-wal";
     if (formerLog == FileId() || Identify(log) != formerLog) {
@@ -83,6 +89,10 @@ std::unique_ptr<Connection> Database::OpenLocked() {
     if (openFile == FileId()) {
         Prepare(*connection);
         directory = std::make_shared<const FileDescriptor>(OpenDatabaseDirectory(file));
+        struct stat status {};
+        if (::fstat(directory->Get(), &status) == 0) {
+            folderOwner = status.st_uid;
+        }
         openFile = identity;
         openLog = Identify(file + "-wal");
     }

@@ -1,10 +1,13 @@
 #pragma once
 
+#include <sys/types.h>
+
 #include <chrono>
 #include <condition_variable>
 #include <cstdint>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -31,6 +34,10 @@ class Database {
     // Counts the files that have stood at the path. Whoever keeps a connection or what was read
     // through one asks here first and starts anew when the number is another one.
     std::uint64_t Generation();
+
+    // The account that the database's folder belonged to when the database was opened; nothing
+    // before that.
+    std::optional<uid_t> FolderOwner();
 
     // A connection of the caller's own.
     std::unique_ptr<Connection> Open();
@@ -110,6 +117,7 @@ class Database {
     FileId openLog;
     // Of this generation's file; null before the first connection is open.
     std::shared_ptr<const FileDescriptor> directory;
+    std::optional<uid_t> folderOwner;
 
     std::mutex turnMutex;
     std::condition_variable turnGivenBack;

@@ -6,7 +6,16 @@
 namespace orva {
 namespace {
 
+// Whether the index of the log could not be made: on a full disk, nearly always.
+bool IsWithoutLogIndex(const SQLite::Exception& error) {
+    return error.getExtendedErrorCode() == SQLITE_IOERR_SHMSIZE ||
+           error.getExtendedErrorCode() == SQLITE_IOERR_SHMOPEN;
+}
+
 ErrorCode CodeOf(const SQLite::Exception& error) {
+    if (IsWithoutLogIndex(error)) {
+        return kErrDatabaseFull;
+    }
     switch (error.getErrorCode()) {
         case SQLITE_BUSY:
         case SQLITE_LOCKED:
@@ -23,10 +32,6 @@ ErrorCode CodeOf(const SQLite::Exception& error) {
             break;
     }
     switch (error.getExtendedErrorCode()) {
-        // The index of the log could not be made: on a full disk, nearly always.
-        case SQLITE_IOERR_SHMSIZE:
-        case SQLITE_IOERR_SHMOPEN:
-            return kErrDatabaseFull;
         case SQLITE_IOERR_SHORT_READ:
         case SQLITE_IOERR_CORRUPTFS:
             return kErrDatabaseCorrupt;
@@ -37,8 +42,10 @@ ErrorCode CodeOf(const SQLite::Exception& error) {
 
 }  // namespace
 
-void ThrowAsStoreFailure(const SQLite::Exception& error) {
-    throw StoreFailure(CodeOf(error), error.what());
+void ThrowAsStoreFailure(const SQLite::Exception& error, const char* file, int line) {
+    // SQLite's own words for it are "disk I/O error".
+    const char* reason = IsWithoutLogIndex(error) ? "no space left for its log" : error.what();
+    throw StoreFailure(CodeOf(error), reason, file, line);
 }
 
 void LogFailure(const Database& database, const StoreFailure& failure) {

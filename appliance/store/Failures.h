@@ -14,7 +14,8 @@ inline int RecordFailure(const StoreFailure& failure) {
 // Runs `operation`, which yields an int, and turns the exceptions of the store into the last error
 // and -1.
 template <class Operation>
-int OrFail(Operation operation, const char* file = __builtin_FILE(), int line = __builtin_LINE()) {
+[[nodiscard]] int OrFail(Operation operation, const char* file = __builtin_FILE(),
+                         int line = __builtin_LINE()) {
     try {
         return operation();
     } catch (const StoreFailure& failure) {

@@ -18,7 +18,6 @@ using orva::Fail;
 using orva::TaskData;
 using Record = _tag_orva_sched_task_;
 
-constexpr const char* kBasic = "basic";
 constexpr const char* kSchedule = "schedule";
 
 // The caller learns only that a section was refused; the log says why.
@@ -41,7 +40,7 @@ orva::SharedTask StoredTask(int id) {
 }
 
 int ReadBasic(const Json::Value& doc, Record& record) {
-    const Json::Value* basic = orva::FindMember(doc, kBasic);
+    const Json::Value* basic = orva::FindMember(doc, orva::kBasicSection);
     if (basic == nullptr) {
         return Refuse(orva::kErrBadDocument, "basic: is missing");
     }
@@ -69,7 +68,7 @@ int ReadBasic(const Json::Value& doc, Record& record) {
     if (stored != nullptr) {
         record.Show(std::move(stored));
     }
-    record.Write([&task](TaskData& data) { data = std::move(task); });
+    record.Take(std::move(task));
     return 0;
 }
 
@@ -96,7 +95,7 @@ bool ORVASchedTaskConvertToJson_Basic(const Record& task, Json::Value& doc) {
         Fail(orva::kErrBadDocument);
         return false;
     }
-    doc[kBasic] = orva::BasicSection(task.Data());
+    doc[orva::kBasicSection] = orva::BasicSection(task.Data());
     return true;
 }
 

@@ -40,23 +40,51 @@ FileDescriptor OpenSocket() {
     return FileDescriptor(::socket(AF_UNIX, SOCK_DGRAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0));
 }
 
-// The socket that all wake-up calls of this process are sent from; none when none can be had.
-const FileDescriptor* WakeSocket() {
-    static std::mutex mutex;
-    static FileDescriptor shared;
-    const std::lock_guard lock(mutex);
-    if (!shared.IsOpen()) {
-        shared = OpenSocket();
-    }
-    return shared.IsOpen() ? &shared : nullptr;
-}
-
 bool Send(const FileDescriptor& socket, const sockaddr_un& address, std::string_view message) {
     return ::sendto(socket.Get(), message.data(), message.size(), MSG_NOSIGNAL,
                     reinterpret_cast<const sockaddr*>(&address), sizeof address) >= 0;
 }
 
 bool NobodyListens(int error) { return error == ENOENT || error == ECONNREFUSED; }
+
+// The way that all wake-up calls of this process go. It stays connected to the scheduler's socket:
+// finding that anew is most of what a call costs.
+class WakeLine {
+  public:
+    // 0, or the errno of what went wrong.
+    int Call(const sockaddr_un& address) {
+        const std::lock_guard lock(mutex);
+        if (connectedTo == address.sun_path && TrySend() == 0) {
+            return 0;
+        }
+        // The scheduler may be another one by now.
+        connectedTo.clear();
+        if (!socket.IsOpen()) {
+            socket = OpenSocket();
+        }
+        if (!socket.IsOpen()) {
+            return errno;
+        }
+        if (::connect(socket.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address) !=
+            0) {
+            return errno;
+        }
+        connectedTo = address.sun_path;
+        return TrySend();
+    }
+
+  private:
+    int TrySend() {
+        const std::string_view message = SchedulerLink::kWakeMessage;
+        const bool sent = ::send(socket.Get(), message.data(), message.size(), MSG_NOSIGNAL) >= 0;
+        // A scheduler with so many messages to read will look for changes anyway.
+        return sent || errno == EAGAIN ? 0 : errno;
+    }
+
+    std::mutex mutex;
+    FileDescriptor socket;
+    std::string connectedTo;
+};
 
 }  // namespace
 
@@ -66,14 +94,15 @@ bool SchedulerLink::IsAlive() {
 }
 
 void SchedulerLink::Wake() {
+    // Never destroyed: threads may still save tasks while the program ends.
+    static auto& line = *new WakeLine;
     const std::optional<sockaddr_un> address = SchedulerAddress();
-    const FileDescriptor* const socket = WakeSocket();
-    if (!address || socket == nullptr) {
+    if (!address) {
         return;
     }
-    if (!Send(*socket, *address, kWakeMessage) && !NobodyListens(errno) && errno != EAGAIN) {
+    if (const int error = line.Call(*address); error != 0 && !NobodyListens(error)) {
         syslog(LOG_WARNING, "cannot wake the scheduler at %s: %s", address->sun_path,
-               std::strerror(errno));
+               std::strerror(error));
     }
 }
 

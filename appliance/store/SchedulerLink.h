@@ -35,7 +35,7 @@ class SchedulerLink {
 
     // Has the scheduler end a run: the processes of its command get SIGTERM, and SIGKILL 10 seconds
     // later if any is left. Does not wait for the end. Nothing when the signal was sent, else why
-    // it could not be. Waits a few seconds at most for the scheduler's answer.
+    // it could not be. Waits up to 16 seconds for the scheduler's answer.
     [[nodiscard]] static std::optional<std::string> Stop(std::int64_t run);
 };
 

@@ -120,6 +120,18 @@ constexpr std::array kMigrations = {
     INSERT INTO recorded_start SELECT task, occurrence FROM run
         WHERE occurrence IS NOT NULL AND task IN (SELECT id FROM task);
     )sql",
+    R"sql(
+    -- Since when the task has had its schedule, or has been enabled: seconds since 1970 UTC, 0 for
+    -- what it was created with. The schedule says nothing about starts before that.
+    ALTER TABLE task ADD COLUMN schedule_since INTEGER NOT NULL DEFAULT 0;
+
+    -- Of the last time that the clock was set: the newest run and what was set. The instants of
+    -- runs up to that one may come from a clock that was wrong. One row at most.
+    CREATE TABLE clock_set (
+        run INTEGER NOT NULL,
+        at INTEGER NOT NULL
+    );
+    )sql",
 };
 
 constexpr std::int64_t kVersion = static_cast<std::int64_t>(kMigrations.size());

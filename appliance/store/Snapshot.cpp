@@ -88,8 +88,11 @@ SortOrder::SortOrder(std::vector<std::uint32_t> indices) : order(std::move(indic
 }
 
 Snapshot::Snapshot(std::vector<SharedTask> allTasks, const absl::TimeZone& zoneToUse,
-                   absl::Time now)
-    : tasks(std::move(allTasks)), zone(zoneToUse), computedAt(now) {
+                   absl::Time now, std::vector<DamagedTask> damagedTasks)
+    : tasks(std::move(allTasks)),
+      damaged(std::move(damagedTasks)),
+      zone(zoneToUse),
+      computedAt(now) {
     flags.reserve(tasks.size());
     nextStarts.reserve(tasks.size());
     for (const SharedTask& task : tasks) {

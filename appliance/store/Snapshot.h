@@ -44,13 +44,16 @@ struct SortOrder {
 // All stored tasks at one time. Immutable; shared by threads.
 class Snapshot {
   public:
-    // `tasks` in ascending order of id. Next starts are computed for `zone`, later than `now`.
-    Snapshot(std::vector<SharedTask> allTasks, const absl::TimeZone& zoneToUse, absl::Time now);
+    // `allTasks` in ascending order of id. Next starts are computed for the zone, later than `now`.
+    Snapshot(std::vector<SharedTask> allTasks, const absl::TimeZone& zoneToUse, absl::Time now,
+             std::vector<DamagedTask> damagedTasks = {});
     Snapshot(const Snapshot&) = delete;
     Snapshot& operator=(const Snapshot&) = delete;
 
+    // All but the damaged ones.
     std::size_t Count() const { return tasks.size(); }
     const std::vector<SharedTask>& Tasks() const { return tasks; }
+    const std::vector<DamagedTask>& Damaged() const { return damaged; }
     const TaskData& Task(std::size_t index) const { return *tasks[index]; }
     std::uint16_t Flags(std::size_t index) const { return flags[index]; }
     StartSecond NextStart(std::size_t index) const { return nextStarts[index]; }
@@ -75,6 +78,7 @@ class Snapshot {
     };
 
     std::vector<SharedTask> tasks;
+    std::vector<DamagedTask> damaged;
     // Beside the tasks and not in them: a walk over all tasks then stays in few cache lines.
     std::vector<std::uint16_t> flags;
     std::vector<StartSecond> nextStarts;

@@ -50,9 +50,18 @@ struct TaskData {
 
 // Does to `task`, which others may have changed meanwhile, the change that led from `base` to
 // `changed`: it takes every property in which the two differ. Each flag is a property of its own;
-// the schedule is one, since its parts only make sense together.
+// the schedule is one, since its parts only make sense together, and so is what the task does: app
+// with its name and args, action, command and edit form.
 void ApplyChange(const TaskData& base, const TaskData& changed, TaskData& task);
 
 using SharedTask = std::shared_ptr<const TaskData>;
+
+// A stored row that holds what no task can.
+struct DamagedTask {
+    std::int64_t id = 0;
+    std::string problem;
+
+    bool operator==(const DamagedTask&) const = default;
+};
 
 }  // namespace orva

@@ -9,12 +9,10 @@
 namespace orva {
 namespace {
 
-constexpr const char* kBasic = "basic";
 constexpr const char* kSchedule = "schedule";
 constexpr const char* kOwner = "owner";
 constexpr const char* kApp = "app";
 constexpr const char* kAction = "action";
-constexpr const char* kCanEditName = "can_edit_name";
 
 struct TextMember {
     const char* name;
@@ -28,7 +26,7 @@ constexpr std::array<TextMember, 4> kTexts = {{
 }};
 
 constexpr std::array<std::string_view, 7> kBasicMembers = {
-    "id", "task_name", kOwner, "enabled", kApp, kAction, kCanEditName};
+    "id", "task_name", kOwner, "enabled", kApp, kAction, kCanEditNameFlag.name};
 
 bool IsBasicMember(std::string_view name) {
     return std::find(kBasicMembers.begin(), kBasicMembers.end(), name) != kBasicMembers.end();
@@ -36,7 +34,7 @@ bool IsBasicMember(std::string_view name) {
 
 bool IsTaskMember(std::string_view name) {
     const auto called = [name](const auto& member) { return member.name == name; };
-    return name == kBasic || name == kSchedule ||
+    return name == kBasicSection || name == kSchedule ||
            std::any_of(kTexts.begin(), kTexts.end(), called) ||
            std::any_of(kFlagNames.begin(), kFlagNames.end(), called);
 }
@@ -86,7 +84,7 @@ std::optional<SectionProblem> ApplyFlag(const Json::Value& object, const FlagNam
 
 std::optional<SectionProblem> ApplyBasic(const Json::Value& basic, TaskData& task,
                                          AccountLookup& accounts) {
-    const std::string prefix = std::string(kBasic) + ".";
+    const std::string prefix = std::string(kBasicSection) + ".";
     if (auto problem = UnknownMember(basic, prefix, IsBasicMember)) {
         return problem;
     }
@@ -105,14 +103,14 @@ std::optional<SectionProblem> ApplyBasic(const Json::Value& basic, TaskData& tas
     if (auto problem = ApplyText(basic, kAction, prefix, task.action)) {
         return problem;
     }
-    return ApplyFlag(basic, {kCanEditName, orva::kCanEditName}, prefix, task);
+    return ApplyFlag(basic, kCanEditNameFlag, prefix, task);
 }
 
 }  // namespace
 
 Json::Value TaskDocument(const TaskData& task) {
     Json::Value document(Json::objectValue);
-    Json::Value& basic = document[kBasic];
+    Json::Value& basic = document[kBasicSection];
     const Json::Value whole = BasicSection(task);
     for (const std::string& name : whole.getMemberNames()) {
         if (IsBasicMember(name)) {
@@ -137,9 +135,9 @@ std::optional<SectionProblem> ApplyTaskDocument(const Json::Value& document, Tas
     if (auto problem = UnknownMember(document, "", IsTaskMember)) {
         return problem;
     }
-    const Json::Value* basic = FindMember(document, kBasic);
+    const Json::Value* basic = FindMember(document, kBasicSection);
     if (basic == nullptr) {
-        return Refused(kBasic, "is missing");
+        return Refused(kBasicSection, "is missing");
     }
     if (auto problem = ApplyBasic(*basic, task, accounts)) {
         return problem;

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <map>
 #include <mutex>
+#include <optional>
 #include <string>
 
 #include "appliance/root/Root.h"
@@ -35,15 +36,24 @@ SharedTask NewTaskOf(uid_t user) {
     return name.empty() ? nullptr : known.emplace(user, NewTaskOf(name)).first->second;
 }
 
+// The account that the task store's folder belongs to; nothing while there is none.
+std::optional<uid_t> OwnerOfTasks() {
+    if (const std::optional<uid_t> owner = TaskStore::Current()->FolderOwner()) {
+        return owner;
+    }
+    static const std::string folder =
+        std::filesystem::path(TaskStore::kDatabaseFile).parent_path().string();
+    struct stat status {};
+    const bool found = ::stat(ResolvePath(folder).c_str(), &status) == 0;
+    return found ? std::optional(status.st_uid) : std::nullopt;
+}
+
 }  // namespace
 
 SharedTask NewTaskDefaults() {
     static const SharedTask ownDefaults = NewTaskOf(OwnAccount());
-    static const std::string folder =
-        std::filesystem::path(TaskStore::kDatabaseFile).parent_path().string();
-    struct stat status {};
-    if (::stat(ResolvePath(folder).c_str(), &status) == 0) {
-        if (SharedTask defaults = NewTaskOf(status.st_uid)) {
+    if (const std::optional<uid_t> owner = OwnerOfTasks()) {
+        if (SharedTask defaults = NewTaskOf(*owner)) {
             return defaults;
         }
     }
@@ -72,6 +82,14 @@ void _tag_orva_sched_task_::ShowSameAs(const _tag_orva_sched_task_& other) {
     own = other.own == nullptr ? nullptr : std::make_shared<orva::TaskData>(*other.own);
     base = other.base;
     seen = own == nullptr ? base : own.get();
+    flags = seen->flags;
+    start = orva::kUnknownStart;
+}
+
+void _tag_orva_sched_task_::Take(orva::TaskData data) {
+    LeaveSnapshot();
+    own = std::make_shared<orva::TaskData>(std::move(data));
+    seen = own.get();
     flags = seen->flags;
     start = orva::kUnknownStart;
 }

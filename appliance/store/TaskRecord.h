@@ -50,6 +50,9 @@ struct _tag_orva_sched_task_ {
     // Has the same base and data as `other`, a record of the same list, from now on.
     void ShowSameAs(const _tag_orva_sched_task_& other);
 
+    // Has `data` as what somebody wrote.
+    void Take(orva::TaskData data);
+
     // Calls `change(TaskData&)` on a copy of the record's own.
     template <class Change>
     void Write(Change change) {

@@ -1,5 +1,7 @@
 #include "appliance/store/TaskSections.h"
 
+#include <algorithm>
+#include <array>
 #include <charconv>
 
 #include "appliance/store/Accounts.h"
@@ -15,23 +17,44 @@ constexpr std::size_t kLongestQuote = 80;
 
 bool IsControl(unsigned char byte) { return byte < 0x20 || byte == 0x7f; }
 
-// Whether the UTF-8 text holds a control character beyond ASCII: U+0080 to U+009F, and the line and
-// paragraph separators U+2028 and U+2029.
-bool HasWideControl(std::string_view text) {
-    for (std::size_t at = 0; at + 1 < text.size(); ++at) {
-        const auto first = static_cast<unsigned char>(text[at]);
-        const auto second = static_cast<unsigned char>(text[at + 1]);
-        if (first == 0xc2 && second < 0xa0) {
-            return true;
-        }
-        if (first == 0xe2 && second == 0x80 && at + 2 < text.size()) {
-            const auto third = static_cast<unsigned char>(text[at + 2]);
-            if (third == 0xa8 || third == 0xa9) {
-                return true;
-            }
-        }
-    }
-    return false;
+struct CharacterRange {
+    char32_t first;
+    char32_t last;
+};
+
+template <std::size_t count>
+bool IsOneOf(const std::array<CharacterRange, count>& ranges, char32_t character) {
+    return std::any_of(ranges.begin(), ranges.end(), [character](const CharacterRange& range) {
+        return range.first <= character && character <= range.last;
+    });
+}
+
+// Beside the control characters themselves, what ends a line or a paragraph.
+constexpr std::array<CharacterRange, 3> kControls = {
+    {{0x00, 0x1f}, {0x7f, 0x9f}, {0x2028, 0x2029}}};
+
+// What turns the direction of the characters after it, so that a name reads as another one, and the
+// byte order mark, which nobody sees.
+constexpr std::array<CharacterRange, 3> kMisleading = {
+    {{0x202a, 0x202e}, {0x2066, 0x2069}, {0xfeff, 0xfeff}}};
+
+// What leaves no mark: spaces, fillers, and what only joins or parts its neighbours.
+constexpr std::array<CharacterRange, 12> kBlanks = {{{0x20, 0x20},
+                                                     {0xa0, 0xa0},
+                                                     {0xad, 0xad},
+                                                     {0x115f, 0x1160},
+                                                     {0x1680, 0x1680},
+                                                     {0x2000, 0x200f},
+                                                     {0x202f, 0x202f},
+                                                     {0x205f, 0x2064},
+                                                     {0x2800, 0x2800},
+                                                     {0x3000, 0x3000},
+                                                     {0x3164, 0x3164},
+                                                     {0xffa0, 0xffa0}}};
+
+// Code points that never stand for a character.
+bool IsNoCharacter(char32_t character) {
+    return (character & 0xfffeU) == 0xfffeU || (character >= 0xfdd0 && character <= 0xfdef);
 }
 
 SectionProblem Refused(const char* member, const std::string& reason,
@@ -153,13 +176,19 @@ std::optional<std::string> NameProblem(std::string_view name) {
     if (ValidUtf8Length(name) != name.size()) {
         return "is no UTF-8 text";
     }
-    for (const char character : name) {
-        if (IsControl(static_cast<unsigned char>(character))) {
+    bool isBlank = true;
+    while (!name.empty()) {
+        const char32_t character = TakeCharacter(name);
+        if (IsOneOf(kControls, character)) {
             return "holds a control character";
         }
+        if (IsOneOf(kMisleading, character) || IsNoCharacter(character)) {
+            return "holds a character that cannot be shown";
+        }
+        isBlank = isBlank && IsOneOf(kBlanks, character);
     }
-    if (HasWideControl(name)) {
-        return "holds a control character";
+    if (isBlank) {
+        return "is blank";
     }
     return std::nullopt;
 }

@@ -30,15 +30,19 @@ class AccountLookup {
     std::map<std::string, bool> known;
 };
 
+// The section's name in a task's document.
+inline constexpr const char* kBasicSection = "basic";
+
 // The yes-or-no properties as documents call them; "enabled" is not among them, it has its own
 // form.
 struct FlagName {
     const char* name;
     TaskFlag flag;
 };
+inline constexpr FlagName kCanEditNameFlag = {"can_edit_name", kCanEditName};
 inline constexpr std::array<FlagName, 9> kFlagNames = {{
     {"simple_edit_form", kSimpleEditForm},
-    {"can_edit_name", kCanEditName},
+    kCanEditNameFlag,
     {"can_edit_owner", kCanEditOwner},
     {"can_run_task_same_time", kCanRunTaskSameTime},
     {"can_run_app_same_time", kCanRunAppSameTime},
@@ -55,8 +59,9 @@ const Json::Value* FindMember(const Json::Value& object, const char* name);
 // are written with; kNewTaskId for -1. Nothing when it is neither.
 std::optional<int> ParseTaskId(const Json::Value& id);
 
-// What is wrong with a task's name; nothing when it may be one: 1 to 255 bytes of UTF-8 without
-// control characters.
+// What is wrong with a task's name; nothing when it may be one: 1 to 255 bytes of UTF-8, not all of
+// them blank, without control characters, code points that are no characters, the byte order mark
+// and what turns the direction of writing.
 std::optional<std::string> NameProblem(std::string_view name);
 
 // What is wrong with a task's command; nothing when it may be one: 131,071 bytes at most. The

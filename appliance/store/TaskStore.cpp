@@ -2,9 +2,11 @@
 
 #include <absl/time/clock.h>
 #include <errno.h>
+#include <syslog.h>
 
 #include <algorithm>
 #include <cstdlib>
+#include <iterator>
 #include <utility>
 
 #include "appliance/root/Root.h"
@@ -13,6 +15,7 @@
 #include "appliance/store/SchedulerLink.h"
 #include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskTable.h"
+#include "appliance/util/CallScope.h"
 
 namespace orva {
 namespace {
@@ -36,6 +39,29 @@ Stores& TheStores() {
     }();
     return *stores;
 }
+
+// The task that the call of this thread has read last, as it was then.
+struct TaskOfCall {
+    std::uint64_t call = 0;
+    const TaskStore* store = nullptr;
+    SharedTask task;
+};
+thread_local TaskOfCall taskOfCall;
+
+SharedTask Recall(const TaskStore* store, int id) {
+    const std::uint64_t call = CallScope::Current();
+    const bool known = call != 0 && taskOfCall.call == call && taskOfCall.store == store &&
+                       taskOfCall.task->id == id;
+    return known ? taskOfCall.task : nullptr;
+}
+
+void Remember(const TaskStore* store, const SharedTask& task) {
+    if (const std::uint64_t call = CallScope::Current(); call != 0 && task != nullptr) {
+        taskOfCall = {call, store, task};
+    }
+}
+
+void Forget() { taskOfCall = {}; }
 
 }  // namespace
 
@@ -67,11 +93,16 @@ TaskStore::TaskStore(std::string databaseFile, const Options& optionsToUse)
 }
 
 SharedTask TaskStore::Find(int id) {
-    return Guarded(database, [&]() -> SharedTask {
+    if (SharedTask known = Recall(this, id)) {
+        return known;
+    }
+    SharedTask found = Guarded(database, [&]() -> SharedTask {
         Database::Lease lease(database);
         std::optional<TaskData> task = ReadTask(*lease, id);
         return task ? std::make_shared<const TaskData>(*std::move(task)) : nullptr;
     });
+    Remember(this, found);
+    return found;
 }
 
 std::shared_ptr<const Snapshot> TaskStore::CurrentSnapshot() {
@@ -103,7 +134,8 @@ std::shared_ptr<const Snapshot> TaskStore::RefreshSnapshot(const absl::TimeZone&
     };
     if (snapshot != nullptr && readVersion() == dataVersion) {
         if (!snapshot->HoldsFor(zoneNow, now)) {
-            snapshot = std::make_shared<const Snapshot>(snapshot->Tasks(), zoneNow, now);
+            snapshot = std::make_shared<const Snapshot>(snapshot->Tasks(), zoneNow, now,
+                                                        snapshot->Damaged());
         }
         return snapshot;
     }
@@ -112,23 +144,34 @@ std::shared_ptr<const Snapshot> TaskStore::RefreshSnapshot(const absl::TimeZone&
     dataVersion = readVersion();
     // Runs come and go much more often than tasks change.
     const bool sameTasks = snapshot != nullptr && NewestChange(*observer) == newestChange;
-    if (!sameTasks || !snapshot->HoldsFor(zoneNow, now)) {
-        snapshot = std::make_shared<const Snapshot>(sameTasks ? snapshot->Tasks() : ReadTasks(),
-                                                    zoneNow, now);
+    if (!sameTasks) {
+        std::vector<DamagedTask> damaged;
+        std::vector<SharedTask> tasks = ReadTasks(damaged);
+        LogDamaged(damaged);
+        snapshot =
+            std::make_shared<const Snapshot>(std::move(tasks), zoneNow, now, std::move(damaged));
+    } else if (!snapshot->HoldsFor(zoneNow, now)) {
+        snapshot =
+            std::make_shared<const Snapshot>(snapshot->Tasks(), zoneNow, now, snapshot->Damaged());
     }
     return snapshot;
 }
 
 // The stored tasks; those that did not change since the last snapshot are shared with it.
-std::vector<SharedTask> TaskStore::ReadTasks() {
+std::vector<SharedTask> TaskStore::ReadTasks(std::vector<DamagedTask>& damaged) {
     const std::int64_t lastSeen = std::exchange(newestChange, NewestChange(*observer));
     std::optional<std::vector<int>> changed;
     if (snapshot != nullptr) {
         changed = TasksChangedAfter(*observer, lastSeen, kMostChangesToFollow);
     }
     if (!changed) {
-        return ReadAllTasks(*observer);
+        return ReadAllTasks(*observer, damaged);
     }
+    const auto unchanged = [&changed](const DamagedTask& task) {
+        return !std::binary_search(changed->begin(), changed->end(), task.id);
+    };
+    std::copy_if(snapshot->Damaged().begin(), snapshot->Damaged().end(),
+                 std::back_inserter(damaged), unchanged);
     const std::vector<SharedTask>& former = snapshot->Tasks();
     std::vector<SharedTask> tasks;
     tasks.reserve(former.size() + changed->size());
@@ -139,15 +182,31 @@ std::vector<SharedTask> TaskStore::ReadTasks() {
                              [](const SharedTask& task, int wanted) { return task->id < wanted; });
         tasks.insert(tasks.end(), next, place);
         next = place != former.end() && (*place)->id == id ? place + 1 : place;
-        if (std::optional<TaskData> task = ReadTask(*observer, id)) {
-            tasks.push_back(std::make_shared<const TaskData>(*std::move(task)));
+        try {
+            if (std::optional<TaskData> task = ReadTask(*observer, id)) {
+                tasks.push_back(std::make_shared<const TaskData>(*std::move(task)));
+            }
+        } catch (const StoreFailure& failure) {
+            damaged.push_back({id, failure.what()});
         }
     }
     tasks.insert(tasks.end(), next, former.end());
     return tasks;
 }
 
+// Those that the last snapshot did not know.
+void TaskStore::LogDamaged(const std::vector<DamagedTask>& damaged) const {
+    for (const DamagedTask& task : damaged) {
+        if (snapshot == nullptr || std::find(snapshot->Damaged().begin(), snapshot->Damaged().end(),
+                                             task) == snapshot->Damaged().end()) {
+            syslog(LOG_ERR, "task store %s: %s: it is left out", database.File().c_str(),
+                   task.problem.c_str());
+        }
+    }
+}
+
 int TaskStore::Save(const TaskData& task) {
+    Forget();
     const absl::Time now = options.clock();
     const StartSecond nextStart = ComputeNextStart(task, zone.Now(), now);
     const int id = Guarded(database, [&] {
@@ -168,6 +227,7 @@ int TaskStore::Save(const TaskData& task) {
 SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
     const absl::TimeZone zoneNow = zone.Now();
     const absl::Time now = options.clock();
+    Forget();
     SharedTask stored = Guarded(database, [&] {
         WriteTransaction transaction(database);
         // Read under the write lock: nobody else changes the task from here to the commit.
@@ -182,10 +242,12 @@ SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
         return std::make_shared<const TaskData>(*std::move(task));
     });
     SchedulerLink::Wake();
+    Remember(this, stored);
     return stored;
 }
 
 void TaskStore::Remove(int id) {
+    Forget();
     Guarded(database, [&] {
         WriteTransaction transaction(database);
         if (!RemoveTask(*transaction, id)) {
@@ -219,6 +281,7 @@ void TaskStore::QueueRun(int id) {
 }
 
 void TaskStore::SaveAll(const std::vector<TaskData>& tasks) {
+    Forget();
     const absl::TimeZone zoneNow = zone.Now();
     const absl::Time now = options.clock();
     Guarded(database, [&] {

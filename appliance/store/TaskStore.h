@@ -42,10 +42,12 @@ class TaskStore {
 
     explicit TaskStore(std::string databaseFile, const Options& optionsToUse);
 
-    // The stored task; null when there is none.
+    // The stored task; null when there is none. A web-API call that asks again for the task that it
+    // asked for last gets what it got then, unless it has changed tasks itself meanwhile.
     SharedTask Find(int id);
 
-    // All stored tasks as they are now. The same object as long as nothing changes.
+    // All stored tasks as they are now. The same object as long as nothing changes. Damaged ones
+    // are left out, and logged when they are found.
     std::shared_ptr<const Snapshot> CurrentSnapshot();
 
     // Stores the task, as a new one when its id is kNewTaskId. Yields its id. Fails when the stored
@@ -72,13 +74,17 @@ class TaskStore {
     absl::Time Now() const { return options.clock(); }
     absl::TimeZone Zone() { return zone.Now(); }
 
+    // The account that the folder of the tasks belongs to; nothing before it has been used.
+    std::optional<uid_t> FolderOwner() { return database.FolderOwner(); }
+
     // The database that the tasks stand in, for what else is kept there. Lives as long as the
     // store.
     Database& UsedDatabase() { return database; }
 
   private:
     std::shared_ptr<const Snapshot> RefreshSnapshot(const absl::TimeZone& zoneNow, absl::Time now);
-    std::vector<SharedTask> ReadTasks();
+    std::vector<SharedTask> ReadTasks(std::vector<DamagedTask>& damaged);
+    void LogDamaged(const std::vector<DamagedTask>& damaged) const;
 
     Options options;
     MachineZone zone;

@@ -37,6 +37,7 @@ enum Column : int {
     kLastMinute,
     kRunMissed,
     kNextStart,
+    kScheduleSince,
 };
 
 constexpr const char* kSelectOne =
@@ -56,15 +57,23 @@ constexpr const char* kUpdate =
     "UPDATE task SET flags = ?2, name = ?3, owner = ?4, app = ?5, app_name = ?6, app_args = ?7, "
     "action = ?8, command = ?9, edit_form = ?10, mode = ?11, repeat = ?12, week_days = ?13, "
     "date = ?14, first_minute = ?15, interval_minutes = ?16, last_minute = ?17, run_missed = ?18, "
-    "next_start = CASE WHEN next_start <= ?20 THEN next_start ELSE ?19 END WHERE id = ?1";
+    // Of the flags kEnabled alone.
+    "schedule_since = CASE WHEN (flags & 1, mode, repeat, week_days, date, first_minute, "
+    "interval_minutes, last_minute, run_missed) IS (?2 & 1, ?11, ?12, ?13, ?14, ?15, ?16, ?17, "
+    "?18) THEN schedule_since ELSE ?19 END WHERE id = ?1";
+// Apart from the rest of an update: whatever the column is set to, SQLite writes a page of its
+// index anew, and most changes leave it as it is.
+constexpr const char* kMoveStart =
+    "UPDATE task SET next_start = ?2 WHERE id = ?1 AND next_start IS NOT ?2 "
+    "AND (next_start IS NULL OR next_start > ?3)";
 constexpr const char* kSelectDue =
     "SELECT id, flags, name, owner, app, app_name, app_args, action, command, edit_form, mode, "
-    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start "
-    "FROM task WHERE next_start <= ? ORDER BY next_start, id LIMIT ?";
+    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start, "
+    "schedule_since FROM task WHERE next_start <= ? ORDER BY next_start, id LIMIT ?";
 constexpr const char* kSelectAfter =
     "SELECT id, flags, name, owner, app, app_name, app_args, action, command, edit_form, mode, "
-    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start "
-    "FROM task WHERE id > ? ORDER BY id LIMIT ?";
+    "repeat, week_days, date, first_minute, interval_minutes, last_minute, run_missed, next_start, "
+    "schedule_since FROM task WHERE id > ? ORDER BY id LIMIT ?";
 
 std::string TextOf(SQLite::Statement& row, int column) {
     // Not as a C string: a text may hold any byte.
@@ -136,7 +145,7 @@ void BindStart(SQLite::Statement& statement, int parameter, StartSecond start) {
 }
 
 // `task` must live until the statement has run.
-void BindTask(SQLite::Statement& statement, const TaskData& task, StartSecond nextStart) {
+void BindTask(SQLite::Statement& statement, const TaskData& task) {
     const Schedule& schedule = task.schedule;
     if (task.id == kNewTaskId) {
         statement.bind(Parameter(kId));
@@ -164,7 +173,6 @@ void BindTask(SQLite::Statement& statement, const TaskData& task, StartSecond ne
     statement.bind(Parameter(kIntervalMinutes), schedule.intervalMinutes);
     statement.bind(Parameter(kLastMinute), schedule.lastMinute);
     statement.bind(Parameter(kRunMissed), schedule.runMissed ? 1 : 0);
-    BindStart(statement, Parameter(kNextStart), nextStart);
 }
 
 // In a damaged row it may be no number: that sorts behind all numbers and comes never.
@@ -179,7 +187,8 @@ StoredStarts StoredStartsOf(SQLite::Statement& rows) {
         starts.last = rows.getColumn(kId).getInt64();
         const SQLite::Column start = rows.getColumn(kNextStart);
         try {
-            starts.tasks.push_back({TaskOf(rows), StartOf(start)});
+            starts.tasks.push_back(
+                {TaskOf(rows), StartOf(start), rows.getColumn(kScheduleSince).getInt64()});
         } catch (const StoreFailure& failure) {
             if (!start.isNull()) {
                 starts.damaged.push_back({starts.last, failure.what()});
@@ -219,11 +228,15 @@ std::optional<TaskData> ReadTask(Connection& connection, int id) {
     return TaskOf(*query);
 }
 
-std::vector<SharedTask> ReadAllTasks(Connection& connection) {
+std::vector<SharedTask> ReadAllTasks(Connection& connection, std::vector<DamagedTask>& damaged) {
     std::vector<SharedTask> tasks;
     Query query = connection.Prepare(kSelectAll);
     while (query->executeStep()) {
-        tasks.push_back(std::make_shared<const TaskData>(TaskOf(*query)));
+        try {
+            tasks.push_back(std::make_shared<const TaskData>(TaskOf(*query)));
+        } catch (const StoreFailure& failure) {
+            damaged.push_back({query->getColumn(kId).getInt64(), failure.what()});
+        }
     }
     return tasks;
 }
@@ -231,7 +244,8 @@ std::vector<SharedTask> ReadAllTasks(Connection& connection) {
 int InsertTask(Connection& connection, const TaskData& task, StartSecond nextStart) {
     {
         Query query = connection.Prepare(kInsert);
-        BindTask(*query, task, nextStart);
+        BindTask(*query, task);
+        BindStart(*query, Parameter(kNextStart), nextStart);
         query->exec();
     }
     const std::int64_t id = connection.LastInsertId();
@@ -246,11 +260,18 @@ bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextSt
                 absl::Time now) {
     {
         Query query = connection.Prepare(kUpdate);
-        BindTask(*query, task, nextStart);
-        query->bind(Parameter(kNextStart) + 1, absl::ToUnixSeconds(now));
+        BindTask(*query, task);
+        query->bind(Parameter(kRunMissed) + 1, absl::ToUnixSeconds(now));
         if (query->exec() == 0) {
             return false;
         }
+    }
+    {
+        Query query = connection.Prepare(kMoveStart);
+        query->bind(1, task.id);
+        BindStart(*query, 2, nextStart);
+        query->bind(3, absl::ToUnixSeconds(now));
+        query->exec();
     }
     RecordChange(connection, task.id);
     return true;

@@ -18,8 +18,8 @@ namespace orva {
 
 std::optional<TaskData> ReadTask(Connection& connection, int id);
 
-// All tasks in ascending order of id.
-std::vector<SharedTask> ReadAllTasks(Connection& connection);
+// All tasks in ascending order of id. Damaged ones are added to `damaged` instead.
+std::vector<SharedTask> ReadAllTasks(Connection& connection, std::vector<DamagedTask>& damaged);
 
 // Stores a new task and yields its id: `task.id`, which must never have been used, or the next free
 // one when that is kNewTaskId.
@@ -49,16 +49,14 @@ std::optional<std::vector<int>> TasksChangedAfter(Connection& connection, std::i
 struct StoredStart {
     TaskData task;
     StartSecond start = kNoStart;
-};
-
-// A row that has a next start and holds what no task can.
-struct DamagedTask {
-    std::int64_t id = 0;
-    std::string problem;
+    // Since when the task has had its schedule, or has been enabled; 0 for what it was created
+    // with.
+    StartSecond scheduleSince = 0;
 };
 
 struct StoredStarts {
     std::vector<StoredStart> tasks;
+    // Of the rows with a next start.
     std::vector<DamagedTask> damaged;
     // How many rows were read, and the id of the last one.
     std::size_t read = 0;

@@ -23,7 +23,7 @@ class Importer {
     // What is wrong with the document; empty when it was taken.
     std::string Add(const Json::Value& document) {
         int id = kNewTaskId;
-        const Json::Value* basic = FindMember(document, "basic");
+        const Json::Value* basic = FindMember(document, kBasicSection);
         if (const Json::Value* member = basic == nullptr ? nullptr : FindMember(*basic, "id")) {
             const std::optional<int> parsed = ParseTaskId(*member);
             if (!parsed) {
@@ -89,10 +89,9 @@ ImportResult ImportTasks(TaskStore& store, std::string_view json) {
     return result;
 }
 
-std::string ExportTasks(TaskStore& store) {
-    const std::shared_ptr<const Snapshot> snapshot = store.CurrentSnapshot();
+std::string ExportTasks(const Snapshot& tasks) {
     Json::Value documents(Json::arrayValue);
-    for (const SharedTask& task : snapshot->Tasks()) {
+    for (const SharedTask& task : tasks.Tasks()) {
         documents.append(TaskDocument(*task));
     }
     Json::StreamWriterBuilder builder;
@@ -101,14 +100,13 @@ std::string ExportTasks(TaskStore& store) {
     return Json::writeString(builder, documents) + "\n";
 }
 
-std::string TaskOverview(TaskStore& store) {
+std::string TaskOverview(const Snapshot& tasks) {
     using Row = std::array<std::string, 5>;
-    const std::shared_ptr<const Snapshot> snapshot = store.CurrentSnapshot();
     std::vector<Row> rows = {{"ID", "ENABLED", "NEXT START", "OWNER", "NAME"}};
-    for (std::size_t index = 0; index < snapshot->Count(); ++index) {
-        const TaskData& task = snapshot->Task(index);
+    for (std::size_t index = 0; index < tasks.Count(); ++index) {
+        const TaskData& task = tasks.Task(index);
         rows.push_back({std::to_string(task.id), task.Has(kEnabled) ? "on" : "off",
-                        FormatNextStart(snapshot->NextStart(index), snapshot->Zone()), task.owner,
+                        FormatNextStart(tasks.NextStart(index), tasks.Zone()), task.owner,
                         task.name});
     }
     std::array<std::size_t, 5> widths{};

@@ -29,9 +29,9 @@ struct ImportResult {
 ImportResult ImportTasks(TaskStore& store, std::string_view json);
 
 // All tasks by id, indented, ended by a newline.
-std::string ExportTasks(TaskStore& store);
+std::string ExportTasks(const Snapshot& tasks);
 
 // One line a task, by id, below a line of titles.
-std::string TaskOverview(TaskStore& store);
+std::string TaskOverview(const Snapshot& tasks);
 
 }  // namespace orva

@@ -27,11 +27,13 @@ Json::Value ParseAndLog(const std::string& content, const std::string& path) {
 
 }  // namespace
 
-Json::Value LocalizedStringParser::ParseTexts(const std::string& directory) const {
+std::shared_ptr<const Json::Value> LocalizedStringParser::ParseTexts(
+    const std::string& directory) const {
+    static const auto none = std::make_shared<const Json::Value>(Json::objectValue);
     static orva::FileCache<Json::Value> cache(kLimits, false, ParseAndLog);
-    const std::shared_ptr<const Json::Value> texts =
+    std::shared_ptr<const Json::Value> texts =
         cache.Get(orva::ResolvePath(directory) + "/strings.json");
-    return texts != nullptr ? *texts : Json::Value(Json::objectValue);
+    return texts != nullptr ? texts : none;
 }
 
 }  // namespace ORVA::ZUM

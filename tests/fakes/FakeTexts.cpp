@@ -1,4 +1,5 @@
 // The text readers of the recording platform.
+#include <memory>
 #include <string>
 
 #include "platform/texts.h"
@@ -29,11 +30,12 @@ Json::Value JSConfigParser::GetTexts() const {
     return texts;
 }
 
-Json::Value LocalizedStringParser::ParseTexts(const std::string& directory) const {
+std::shared_ptr<const Json::Value> LocalizedStringParser::ParseTexts(
+    const std::string& directory) const {
     const bool fails = Platform().Enter("ParseTexts", fakes::Quoted(directory), Kind::kTexts);
     const auto found = Platform().texts.find(directory);
-    return fails || found == Platform().texts.end() ? Json::Value(Json::objectValue)
-                                                    : found->second;
+    return std::make_shared<const Json::Value>(
+        fails || found == Platform().texts.end() ? Json::Value(Json::objectValue) : found->second);
 }
 
 }  // namespace ORVA::ZUM

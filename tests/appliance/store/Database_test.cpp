@@ -2,13 +2,10 @@
 
 #include <SQLiteCpp/SQLiteCpp.h>
 #include <gmock/gmock.h>
-#include <sys/mount.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <chrono>
 #include <filesystem>
-#include <fstream>
 #include <memory>
 #include <string>
 #include <thread>
@@ -16,83 +13,13 @@
 
 #include "appliance/root/Root.h"
 #include "appliance/store/DatabaseFile.h"
-#include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskTable.h"
-#include "platform/qlibc.h"
-#include "tests/appliance/store/StoreTest.h"
+#include "tests/appliance/store/DatabaseTest.h"
 
 namespace {
 
 using orva::TaskStore;
 using testing::HasSubstr;
-
-class DatabaseTest : public StoreTest {
-  protected:
-    static std::size_t Count() { return TaskStore::Current()->CurrentSnapshot()->Count(); }
-
-    // What an operation on the store fails with, and the one line that it logs.
-    struct Failed {
-        int code = 0;
-        std::string log;
-    };
-    static Failed Saving() {
-        return Trying([] { TaskStore::Current()->Save(SampleTask("x")); });
-    }
-    static Failed Listing() {
-        return Trying([] { TaskStore::Current()->CurrentSnapshot(); });
-    }
-    template <class Operation>
-    static Failed Trying(Operation operation) {
-        TakeLog();
-        Failed failed;
-        try {
-            operation();
-        } catch (const orva::StoreFailure& failure) {
-            failed.code = failure.Code();
-        }
-        const std::vector<std::string> log = TakeLog();
-        failed.log = log.size() == 1 ? log[0] : std::to_string(log.size()) + " log lines";
-        return failed;
-    }
-
-    // Whether nobody sets the database up or waits for his turn to write.
-    bool CanLockDirectory() const {
-        try {
-            return orva::LockDatabaseDirectory(DatabasePath(), std::chrono::milliseconds(0))
-                .IsOpen();
-        } catch (const orva::StoreFailure&) {
-            return false;
-        }
-    }
-
-    template <class Condition>
-    static bool BecomesTrue(Condition condition) {
-        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
-        while (!condition()) {
-            if (std::chrono::steady_clock::now() > deadline) {
-                return false;
-            }
-            std::this_thread::yield();
-        }
-        return true;
-    }
-
-    // Both kinds of use fail in the same way, and the file keeps its bytes.
-    void ExpectRefused(int code, const std::string& reason) const {
-        const std::string before = Read("/usr/orva/var/tasks.db");
-        for (const Failed& failed : {Listing(), Saving()}) {
-            EXPECT_EQ(failed.code, code);
-            EXPECT_THAT(failed.log, HasSubstr("task store " + DatabasePath() + ": "));
-            EXPECT_THAT(failed.log, HasSubstr(reason));
-        }
-        EXPECT_EQ(Read("/usr/orva/var/tasks.db"), before);
-    }
-
-    static int ModeOf(const std::string& path) {
-        struct stat status {};
-        return ::stat(path.c_str(), &status) == 0 ? static_cast<int>(status.st_mode & 07777) : -1;
-    }
-};
 
 TEST_F(DatabaseTest, AMissingDatabaseIsCreatedWithItsDirectoryForItsGroup) {
     const mode_t mask = ::umask(077);
@@ -301,89 +228,6 @@ TEST_F(DatabaseTest, ADamageThatIsRepairedIsForgotten) {
     EXPECT_EQ(Listing().code, orva::kErrDatabaseCorrupt);
     Write("/usr/orva/var/tasks.db", good);
     EXPECT_EQ(Count(), 1U);
-}
-
-TEST_F(DatabaseTest, AReadOnlyFileSystemIsReportedAsThat) {
-    TaskStore::Current()->Save(SampleTask("a"));
-    TaskStore::Configure({});
-    EXPECT_EQ(
-        InOwnMounts([this]() -> std::string {
-            const std::string directory = RootPath() + "/usr/orva/var";
-            // Root writes through mode bits, but not through a mount.
-            if (::mount(directory.c_str(), directory.c_str(), nullptr, MS_BIND, nullptr) != 0 ||
-                ::mount("none", directory.c_str(), nullptr, MS_BIND | MS_REMOUNT | MS_RDONLY,
-                        nullptr) != 0) {
-                return "cannot mount";
-            }
-            const Failed failed = Saving();
-            if (failed.code != orva::kErrDatabaseFull) {
-                return "code " + std::to_string(failed.code);
-            }
-            const std::string expected =
-                "task store " + DatabasePath() + ": cannot be written to: Read-only file system";
-            return failed.log == expected ? "" : failed.log;
-        }),
-        "");
-    EXPECT_EQ(Count(), 1U);
-}
-
-TEST_F(DatabaseTest, ADatabaseThatCannotBeCreatedOnAReadOnlyFileSystemSaysSo) {
-    EXPECT_EQ(InOwnMounts([this]() -> std::string {
-                  if (::mount("none", RootPath().c_str(), "tmpfs", MS_RDONLY, nullptr) != 0) {
-                      return "cannot mount";
-                  }
-                  const Failed failed = Listing();
-                  return failed.code == orva::kErrDatabaseFull ? "" : failed.log;
-              }),
-              "");
-}
-
-TEST_F(DatabaseTest, AFullDiskLosesNothingThatWasAcknowledged) {
-    EXPECT_EQ(InOwnMounts([this]() -> std::string {
-                  if (::mount("none", RootPath().c_str(), "tmpfs", 0, "size=2m") != 0) {
-                      return "cannot mount";
-                  }
-                  orva::TaskData task = SampleTask("a");
-                  task.appArgs = std::string(20000, 'x');
-                  std::size_t saved = 0;
-                  Failed failed;
-                  while (failed.code == 0 && saved < 1000) {
-                      failed = Trying([&task] { TaskStore::Current()->Save(task); });
-                      saved += failed.code == 0 ? 1 : 0;
-                  }
-                  if (failed.code != orva::kErrDatabaseFull) {
-                      return "code " + std::to_string(failed.code) + ": " + failed.log;
-                  }
-                  if (failed.log != "task store " + DatabasePath() + ": database or disk is full") {
-                      return failed.log;
-                  }
-                  Reopen();
-                  if (saved == 0 || Count() != saved) {
-                      return "stored " + std::to_string(Count()) + " of " + std::to_string(saved);
-                  }
-                  TaskStore::Configure({});
-                  SQLite::Database database(DatabasePath(), SQLite::OPEN_READWRITE);
-                  return database.execAndGet("PRAGMA integrity_check").getString() == "ok"
-                             ? ""
-                             : "not intact";
-              }),
-              "");
-}
-
-TEST_F(DatabaseTest, AFullDiskFromTheStartIsReportedAsThat) {
-    EXPECT_EQ(InOwnMounts([this]() -> std::string {
-                  if (::mount("none", RootPath().c_str(), "tmpfs", 0, "size=64k") != 0) {
-                      return "cannot mount";
-                  }
-                  std::ofstream filler(RootPath() + "/filler");
-                  while (filler.put('x').flush()) {
-                  }
-                  const Failed failed = Listing();
-                  return failed.code == orva::kErrDatabaseFull
-                             ? ""
-                             : std::to_string(failed.code) + " " + failed.log;
-              }),
-              "");
 }
 
 }  // namespace

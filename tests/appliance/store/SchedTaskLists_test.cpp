@@ -208,13 +208,15 @@ TEST_F(SchedTaskListsTest, SavingAnElementChangesOnlyWhatWasWrittenToIt) {
     for (const int id : {4, 5}) {
         ASSERT_EQ(ORVASchedTaskLoad(id, other.Get()), 0);
         ORVASchedCTaskSetCommand(other.Get(), "command of the other");
+        ORVASchedCTaskSetCanEditName(other.Get(), 0);
         ASSERT_EQ(ORVASchedTaskSave(other.Get()), 0);
     }
-    ORVASchedCTaskSetAction(fourth, "changed");
+    ORVASchedCTaskSetSimpleEditForm(fourth, 1);
     ASSERT_EQ(ORVASchedTaskSave(fourth), 0);
     ASSERT_EQ(ORVASchedTaskSave(fifth), 0);
     const orva::SharedTask storedFourth = orva::TaskStore::Current()->Find(4);
-    EXPECT_EQ(storedFourth->action, "changed");
+    EXPECT_TRUE(storedFourth->Has(orva::kSimpleEditForm));
+    EXPECT_FALSE(storedFourth->Has(orva::kCanEditName));
     EXPECT_EQ(storedFourth->command, "command of the other");
     const orva::SharedTask storedFifth = orva::TaskStore::Current()->Find(5);
     EXPECT_FALSE(storedFifth->Has(orva::kEnabled));

@@ -164,11 +164,29 @@ TEST_F(SchedTaskSectionsTest, RefusesNamesThatAreNone) {
                   "task refused: basic.task_name: holds a control character")
             << name;
     }
+    for (const char* name :
+         {R"("a\u202agpj.exe")", R"("a\u202egpj.exe")", R"("\u2066a")", R"("a\u2069")",
+          R"("\ufeff")", R"("\ufeffa")", R"("\ufffe\uffff")", R"("a\ufdd0")", R"("a\ufdef")",
+          R"("\ud83f\udffe")", R"("\udbff\udfff")"}) {
+        EXPECT_EQ(BasicProblem(NewTask("\"task_name\":" + std::string(name))),
+                  "task refused: basic.task_name: holds a character that cannot be shown")
+            << name;
+    }
+    for (const char* name : {R"(" ")", R"("   ")", R"("\u00a0\u3000 ")", R"("\u200b\u2060\u00ad")",
+                             R"("\u3164\u2800")"}) {
+        EXPECT_EQ(BasicProblem(NewTask("\"task_name\":" + std::string(name))),
+                  "task refused: basic.task_name: is blank")
+            << name;
+    }
     for (const char* name : {"1", "true", "[]", "{}"}) {
         EXPECT_EQ(BasicProblem(NewTask("\"task_name\":" + std::string(name))),
                   "task refused: basic.task_name: is no text");
     }
-    EXPECT_EQ(BasicProblem(NewTask(R"("task_name":"\u00a0 \ud83d\ude00 \u2027")")), "");
+    for (const char* name :
+         {R"("\u00a0 \ud83d\ude00 \u2027")", R"("\ud83d\udc69\u200d\ud83d\udd27")", R"(" a ")",
+          R"("\u200e\u05d0")", R"("\ufdcf\ufdf0\ufffd")", R"("\u3042\u0e01\udbff\udffd")"}) {
+        EXPECT_EQ(BasicProblem(NewTask("\"task_name\":" + std::string(name))), "") << name;
+    }
 }
 
 TEST_F(SchedTaskSectionsTest, RefusesBytesThatAreNoUtf8AndNul) {

@@ -91,6 +91,26 @@ TEST_F(SchedulerLinkTest, EveryChangeOfTheTasksWakesTheScheduler) {
     EXPECT_EQ(scheduler.Wakeups(), 0);
 }
 
+TEST_F(SchedulerLinkTest, ASchedulerThatTookTheFormerOnesPlaceIsWoken) {
+    for (int round = 0; round < 3; ++round) {
+        FakeScheduler scheduler(RootPath());
+        SchedulerLink::Wake();
+        SchedulerLink::Wake();
+        EXPECT_EQ(scheduler.Wakeups(), 2);
+        std::filesystem::remove(RootPath() + "/run/orva/schedd.sock");
+    }
+    const std::string second = RootPath() + "/second";
+    MakeDirectory("/second/run/orva");
+    FakeScheduler here(RootPath());
+    SchedulerLink::Wake();
+    orva::SetRoot(second);
+    FakeScheduler there(second);
+    SchedulerLink::Wake();
+    EXPECT_EQ(here.Wakeups(), 1);
+    EXPECT_EQ(there.Wakeups(), 1);
+    EXPECT_THAT(TakeLog(), testing::IsEmpty());
+}
+
 TEST_F(SchedulerLinkTest, NobodyWaitsForASchedulerThatIsBehind) {
     FakeScheduler scheduler(RootPath());
     for (int count = 0; count < 2000; ++count) {

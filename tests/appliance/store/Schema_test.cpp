@@ -94,7 +94,7 @@ TEST_F(SchemaTest, AFileOfTheFirstVersionKeepsItsTasksAndQueuedRuns) {
     const orva::SharedTask task = TaskStore::Current()->Find(3);
     ASSERT_NE(task, nullptr);
     EXPECT_EQ(task->name, "nightly");
-    EXPECT_THAT(Rows("PRAGMA user_version"), ElementsAre("3"));
+    EXPECT_THAT(Rows("PRAGMA user_version"), ElementsAre("4"));
     EXPECT_THAT(
         Rows("SELECT id || ' ' || task || ' ' || task_name || ' ' || reason || ' ' || state "
              "|| ' ' || queued_at || ' ' || asked_program FROM run ORDER BY id"),

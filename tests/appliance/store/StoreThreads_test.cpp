@@ -128,24 +128,48 @@ TEST_F(StoreThreadsTest, NoTwoTasksGetTheSameId) {
 TEST_F(StoreThreadsTest, ChangesOfDifferentPropertiesOfOneTaskAreAllKept) {
     constexpr int kChanges = 40;
     TaskStore::Current()->Save(SampleTask("a"));
-    const std::vector<int (*)(_tag_orva_sched_task_*, const char*)> writers = {
-        ORVASchedCTaskSetAppArgs, ORVASchedCTaskSetAction, ORVASchedCTaskSetCommand,
-        ORVASchedCTaskSetEditForm};
-    const std::vector<std::string orva::TaskData::*> properties = {
-        &orva::TaskData::appArgs, &orva::TaskData::action, &orva::TaskData::command,
-        &orva::TaskData::editForm};
+    struct Property {
+        int (*write)(_tag_orva_sched_task_* task, int count);
+        bool (*holds)(const orva::TaskData& task, int count);
+    };
+    const std::vector<Property> properties = {
+        {[](_tag_orva_sched_task_* task, int count) {
+             return ORVASchedCTaskSetCommand(task, std::to_string(count).c_str());
+         },
+         [](const orva::TaskData& task, int count) {
+             return task.command == std::to_string(count);
+         }},
+        {[](_tag_orva_sched_task_* task, int count) {
+             Json::Value document;
+             document["schedule"]["min"] = count;
+             return ORVASchedTaskConvertFromJson_Schedule(document, *task) ? 0 : -1;
+         },
+         [](const orva::TaskData& task, int count) {
+             return task.schedule.firstMinute % 60 == count;
+         }},
+        {[](_tag_orva_sched_task_* task, int count) {
+             return ORVASchedCTaskSetState(task, count % 2 == 0);
+         },
+         [](const orva::TaskData& task, int count) {
+             return task.Has(orva::kEnabled) == (count % 2 == 0);
+         }},
+        {[](_tag_orva_sched_task_* task, int count) {
+             return ORVASchedCTaskSetCanEditName(task, count % 2);
+         },
+         [](const orva::TaskData& task, int count) {
+             return task.Has(orva::kCanEditName) == (count % 2 == 1);
+         }},
+    };
     std::atomic<int> failures = 0;
     std::vector<std::thread> threads;
-    threads.reserve(writers.size());
-    for (std::size_t number = 0; number < writers.size(); ++number) {
-        threads.emplace_back([&, number] {
+    threads.reserve(properties.size());
+    for (const Property& property : properties) {
+        threads.emplace_back([&failures, property] {
             for (int count = 1; count <= kChanges; ++count) {
-                const std::string text = std::to_string(count);
                 const Record task;
                 if (ORVASchedTaskLoad(1, task.Get()) != 0 ||
-                    writers[number](task.Get(), text.c_str()) != 0 ||
-                    ORVASchedTaskSave(task.Get()) != 0 ||
-                    (*TaskStore::Current()->Find(1)).*properties[number] != text) {
+                    property.write(task.Get(), count) != 0 || ORVASchedTaskSave(task.Get()) != 0 ||
+                    !property.holds(*TaskStore::Current()->Find(1), count)) {
                     ++failures;
                 }
             }

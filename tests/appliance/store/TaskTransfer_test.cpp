@@ -50,7 +50,7 @@ TEST_F(TaskTransferTest, AnExportHoldsEverythingInAFixedForm) {
     task.editForm = "form";
     task.Set(orva::kListable, false);
     TaskStore::Current()->Save(task);
-    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()), R"([
+    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot()), R"([
   {
     "app_args" : "{\"script\":\"x\"}\n",
     "app_name" : "#a:b#",
@@ -63,8 +63,8 @@ TEST_F(TaskTransferTest, AnExportHoldsEverythingInAFixedForm) {
       "id" : 1,
       "owner" : "root",
       "task_name" : "N)"
-                                                        "\xc3\xa4"
-                                                        R"(he"
+                                                                           "\xc3\xa4"
+                                                                           R"(he"
     },
     "can_delete_from_ui" : true,
     "can_edit_from_ui" : true,
@@ -96,7 +96,7 @@ TEST_F(TaskTransferTest, AnExportHoldsEverythingInAFixedForm) {
 }
 
 TEST_F(TaskTransferTest, AnEmptyStoreIsAnEmptyArray) {
-    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()), "[]\n");
+    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot()), "[]\n");
     EXPECT_EQ(orva::ImportTasks(*TaskStore::Current(), "[]").problem, "");
 }
 
@@ -118,14 +118,14 @@ TEST_F(TaskTransferTest, AnExportImportedIntoAnEmptyApplianceExportsTheSameBytes
     TaskStore::Current()->SaveAll(tasks);
     TaskStore::Current()->Remove(3);
     TaskStore::Current()->Remove(20);
-    const std::string exported = orva::ExportTasks(*TaskStore::Current());
+    const std::string exported = orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot());
 
     MakeDirectory("/second");
     orva::SetRoot(RootPath() + "/second");
     const orva::ImportResult result = orva::ImportTasks(*TaskStore::Current(), exported);
     EXPECT_EQ(result.problem, "");
     EXPECT_EQ(result.count, 18U);
-    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()), exported);
+    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot()), exported);
 }
 
 TEST_F(TaskTransferTest, TheIdOfAStoredTaskReplacesIt) {
@@ -202,9 +202,9 @@ TEST_F(TaskTransferTest, AnIdThatWouldUseUpTheIdsIsRefused) {
               "");
     // One that is stored already uses up nothing.
     EXPECT_EQ(TaskStore::Current()->Save(SampleTask("b")), 1000000001);
-    const std::string exported = orva::ExportTasks(*TaskStore::Current());
+    const std::string exported = orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot());
     EXPECT_EQ(orva::ImportTasks(*TaskStore::Current(), exported).problem, "");
-    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()), exported);
+    EXPECT_EQ(orva::ExportTasks(*TaskStore::Current()->CurrentSnapshot()), exported);
 }
 
 TEST_F(TaskTransferTest, TheOverviewIsATable) {
@@ -213,7 +213,7 @@ TEST_F(TaskTransferTest, TheOverviewIsATable) {
     off.owner = "www-data";
     off.Set(orva::kEnabled, false);
     TaskStore::Current()->Save(off);
-    EXPECT_EQ(orva::TaskOverview(*TaskStore::Current()),
+    EXPECT_EQ(orva::TaskOverview(*TaskStore::Current()->CurrentSnapshot()),
               "ID  ENABLED  NEXT START        OWNER     NAME\n"
               "1   on       2026-05-02 06:30  root      Backup\n"
               "2   off      N/A               www-data  Off\n");

@@ -2,7 +2,11 @@
 
 #include <gmock/gmock.h>
 
+#include <atomic>
 #include <filesystem>
+#include <string>
+#include <thread>
+#include <vector>
 
 #include "tests/appliance/util/Sandbox.h"
 
@@ -50,7 +54,8 @@ class InstalledAppsTest : public Sandbox {
 
     std::vector<std::string> Found() const {
         std::vector<std::string> found;
-        for (const orva::InstalledApp& app : *FindInstalledApps(Directory())) {
+        const auto apps = FindInstalledApps(Directory());
+        for (const orva::InstalledApp& app : *apps) {
             found.push_back(app.folder + " " + app.description.id + " " + app.description.texts);
         }
         return found;
@@ -89,6 +94,33 @@ TEST_F(InstalledAppsTest, SeesApplicationsComeChangeAndGo) {
     EXPECT_THAT(Found(), ElementsAre("b B t"));
     Install("c", R"({"id": "C", "texts": "t"})");
     EXPECT_THAT(Found(), ElementsAre("b B t", "c C t"));
+}
+
+TEST_F(InstalledAppsTest, GivesEveryThreadWhatIsInstalledWhileAnApplicationComesAndGoes) {
+    Install("a", R"({"id": "A", "texts": "t"})");
+    const std::vector<std::string> without = {"a A t"};
+    const std::vector<std::string> with = {"a A t", "b B t"};
+    std::atomic<bool> over = false;
+    {
+        std::vector<std::jthread> readers;
+        for (int reader = 0; reader < 4; ++reader) {
+            readers.emplace_back([&] {
+                do {
+                    EXPECT_THAT(Found(), testing::AnyOf(without, with));
+                } while (!over);
+            });
+        }
+        for (int round = 0; round < 100; ++round) {
+            // Moved into its place as a whole, as an installation does it.
+            Write("/new/app.json", R"({"id": "B", "texts": "t"})");
+            std::filesystem::rename(RootPath() + "/new", Directory() + "/b");
+            EXPECT_EQ(Found(), with);
+            std::filesystem::rename(Directory() + "/b", RootPath() + "/old");
+            EXPECT_EQ(Found(), without);
+            std::filesystem::remove_all(RootPath() + "/old");
+        }
+        over = true;
+    }
 }
 
 TEST_F(InstalledAppsTest, LeavesOutMissingAndDamagedDescriptionsAndLogsEachOnce) {

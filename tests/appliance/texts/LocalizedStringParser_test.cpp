@@ -18,31 +18,33 @@ constexpr const char* kFile = "/usr/orva/orvaman/webman/texts/en/strings.json";
 
 class LocalizedStringParserTest : public Sandbox {
   protected:
+    Json::Value Texts(const std::string& directory) const { return *parser.ParseTexts(directory); }
+
     const LocalizedStringParser parser{};
     const Json::Value empty{Json::objectValue};
 };
 
 TEST_F(LocalizedStringParserTest, GivesTheTextsOfADirectory) {
     Write(kFile, R"({"common": {"run": "Run"}})");
-    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
-    EXPECT_EQ(parser.ParseTexts(std::string(kDirectory) + "/")["common"]["run"].asString(), "Run");
+    EXPECT_EQ(Texts(kDirectory)["common"]["run"].asString(), "Run");
+    EXPECT_EQ(Texts(std::string(kDirectory) + "/")["common"]["run"].asString(), "Run");
 }
 
 TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectWithoutADirectoryOrAFile) {
-    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_EQ(Texts(kDirectory), empty);
     MakeDirectory(kDirectory);
-    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_EQ(Texts(kDirectory), empty);
     EXPECT_THAT(TakeLog(), IsEmpty());
 }
 
 TEST_F(LocalizedStringParserTest, GivesAnEmptyObjectForADamagedFileAndLogsItOnce) {
     Write(kFile, R"(["run"])");
     for (int i = 0; i < 5; ++i) {
-        EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+        EXPECT_EQ(Texts(kDirectory), empty);
     }
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": the document is no object"));
     Write(kFile, "{");
-    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_EQ(Texts(kDirectory), empty);
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
                                        ": line 1, column 2: missing '}' or object member name"));
 }
@@ -52,12 +54,12 @@ TEST_F(LocalizedStringParserTest, ServesTheRestOfAFileWithAFaultAndLogsItOnceAVe
     Json::Value rest;
     rest["common"]["run"] = "Run";
     for (int i = 0; i < 5; ++i) {
-        EXPECT_EQ(parser.ParseTexts(kDirectory), rest);
+        EXPECT_EQ(Texts(kDirectory), rest);
     }
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
                                        ": section \"service\" is no object (faults in all: 2)"));
     Write(kFile, R"({"common": {"run": "Run", "stop": 7}})");
-    EXPECT_EQ(parser.ParseTexts(kDirectory), rest);
+    EXPECT_EQ(Texts(kDirectory), rest);
     EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": \"common:stop\" is no text"));
 }
 
@@ -71,7 +73,7 @@ TEST_F(LocalizedStringParserTest, RemembersTheTextsOfAsManyApplicationsAsThereCa
     }
     for (int round = 0; round < 2; ++round) {
         for (int app = 0; app < kApps; ++app) {
-            EXPECT_EQ(parser.ParseTexts(directory(app)), empty);
+            EXPECT_EQ(Texts(directory(app)), empty);
         }
         // A file is logged when it is parsed.
         EXPECT_EQ(TakeLog().size(), round == 0 ? std::size_t{kApps} : 0U);
@@ -80,18 +82,21 @@ TEST_F(LocalizedStringParserTest, RemembersTheTextsOfAsManyApplicationsAsThereCa
 
 TEST_F(LocalizedStringParserTest, SeesAChangedFileAtOnce) {
     Write(kFile, R"({"common": {"run": "Run"}})");
-    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
+    EXPECT_EQ(Texts(kDirectory)["common"]["run"].asString(), "Run");
     Write(kFile, R"({"common": {"run": "Los"}})");
-    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Los");
+    EXPECT_EQ(Texts(kDirectory)["common"]["run"].asString(), "Los");
     std::filesystem::remove(RootPath() + kFile);
-    EXPECT_EQ(parser.ParseTexts(kDirectory), empty);
+    EXPECT_EQ(Texts(kDirectory), empty);
 }
 
-TEST_F(LocalizedStringParserTest, GivesEveryCallerACopyOfItsOwn) {
+TEST_F(LocalizedStringParserTest, SharesOneDocumentBetweenAllWhoAskWhileTheFileStaysTheSame) {
     Write(kFile, R"({"common": {"run": "Run"}})");
-    Json::Value mine = parser.ParseTexts(kDirectory);
-    mine["common"]["run"] = "changed";
-    EXPECT_EQ(parser.ParseTexts(kDirectory)["common"]["run"].asString(), "Run");
+    const auto before = parser.ParseTexts(kDirectory);
+    EXPECT_EQ(LocalizedStringParser().ParseTexts(kDirectory), before);
+    Write(kFile, R"({"common": {"run": "Los"}})");
+    const auto after = parser.ParseTexts(kDirectory);
+    EXPECT_EQ((*before)["common"]["run"].asString(), "Run");
+    EXPECT_EQ((*after)["common"]["run"].asString(), "Los");
 }
 
 TEST_F(LocalizedStringParserTest, ServesManyThreadsWhileTheFileChanges) {
@@ -102,8 +107,8 @@ TEST_F(LocalizedStringParserTest, ServesManyThreadsWhileTheFileChanges) {
     for (int i = 0; i < 4; ++i) {
         threads.emplace_back([&] {
             while (!stop) {
-                const Json::Value texts = LocalizedStringParser().ParseTexts(kDirectory);
-                const std::string text = texts["common"]["run"].asString();
+                const auto texts = LocalizedStringParser().ParseTexts(kDirectory);
+                const std::string text = (*texts)["common"]["run"].asString();
                 wrong += text == "Run" || text == "Start" ? 0 : 1;
             }
         });

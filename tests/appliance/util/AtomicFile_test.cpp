@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
 
 #include "platform/qlibc.h"
@@ -51,19 +52,33 @@ TEST_F(AtomicFileTest, WritesOverWhatACrashLeftBehind) {
 TEST_F(AtomicFileTest, FollowsNoLinkInThePlaceOfThePreparedFile) {
     Write("/elsewhere", "precious");
     std::filesystem::create_symlink(Path("elsewhere"), Path("file.new"));
-    EXPECT_LT(orva::WriteFileAtomically(Path("file"), "new"), 0);
-    EXPECT_EQ(QLIBCErrGet(), 0x0500);
+    EXPECT_EQ(orva::WriteFileAtomically(Path("file"), "new"), 0);
+    EXPECT_EQ(Read("/file"), "new");
     EXPECT_EQ(Read("/elsewhere"), "precious");
+}
+
+TEST_F(AtomicFileTest, ReplacesWhatACrashOfAnotherAccountLeftBehind) {
+    Write("/file.new", "half");
+    ASSERT_EQ(::chmod(Path("file.new").c_str(), 0400), 0);
+    struct stat before {};
+    ASSERT_EQ(::stat(Path("file.new").c_str(), &before), 0);
+    EXPECT_EQ(orva::WriteFileAtomically(Path("file"), "new"), 0);
+    struct stat after {};
+    ASSERT_EQ(::stat(Path("file").c_str(), &after), 0);
+    EXPECT_EQ(after.st_mode & 07777, 0644U);
+    EXPECT_EQ(Read("/file"), "new");
 }
 
 TEST_F(AtomicFileTest, LeavesTheFormerFileWhenTheDirectoryIsGone) {
     EXPECT_LT(orva::WriteFileAtomically(Path("none/file"), "new"), 0);
+    EXPECT_EQ(errno, ENOENT);
     EXPECT_EQ(QLIBCErrGet(), 0x0500);
 }
 
 TEST_F(AtomicFileTest, LeavesNothingWhenTheFileCannotBeReplaced) {
     MakeDirectory("/file/with content");
     EXPECT_LT(orva::WriteFileAtomically(Path("file"), "new"), 0);
+    EXPECT_EQ(errno, EISDIR);
     EXPECT_EQ(Entries(), 1U);
 }
 

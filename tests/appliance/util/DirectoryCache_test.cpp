@@ -2,9 +2,12 @@
 
 #include <gmock/gmock.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <filesystem>
+#include <thread>
+#include <vector>
 
 #include "tests/appliance/util/Sandbox.h"
 
@@ -95,6 +98,34 @@ TEST_F(DirectoryCacheTest, LogsOnceWhatIsNoDirectory) {
     std::vector<std::string> names = {"old"};
     EXPECT_EQ(orva::ListFolders(RootPath() + "/d", names), ENOTDIR);
     EXPECT_THAT(names, IsEmpty());
+}
+
+TEST_F(DirectoryCacheTest, GivesEveryThreadAListThatWasTrueWhileAFolderComesAndGoes) {
+    MakeDirectory("/d/a");
+    const std::vector<std::string> without = {"a"};
+    const std::vector<std::string> with = {"a", "b"};
+    std::atomic<bool> over = false;
+    std::atomic<int> seen = 0;
+    {
+        std::vector<std::jthread> readers;
+        for (int reader = 0; reader < 4; ++reader) {
+            readers.emplace_back([&] {
+                do {
+                    const auto folders = cache.Get(RootPath() + "/d");
+                    EXPECT_THAT(*folders, testing::AnyOf(without, with));
+                    ++seen;
+                } while (!over);
+            });
+        }
+        for (int round = 0; round < 100; ++round) {
+            MakeDirectory("/d/b");
+            EXPECT_EQ(*cache.Get(RootPath() + "/d"), with);
+            std::filesystem::remove(RootPath() + "/d/b");
+            EXPECT_EQ(*cache.Get(RootPath() + "/d"), without);
+        }
+        over = true;
+    }
+    EXPECT_GE(seen, 4);
 }
 
 }  // namespace

@@ -2,7 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdint>
 #include <string>
+#include <string_view>
+#include <vector>
 
 namespace {
 
@@ -28,6 +31,17 @@ TEST(ValidUtf8LengthTest, TakesNoSurrogateNoOverLongFormAndNothingBeyondTheLastC
     EXPECT_EQ(ValidUtf8Length("\xF0\x8F\xBF\xBF"), 0U);
     EXPECT_EQ(ValidUtf8Length("\xF4\x90\x80\x80"), 0U);
     EXPECT_EQ(ValidUtf8Length("\xF5\x80\x80\x80"), 0U);
+}
+
+TEST(TakeCharacterTest, YieldsTheCharactersOfATextInTheirOrder) {
+    std::string_view text =
+        "a\x7F\xC2\x80\xDF\xBF\xE0\xA0\x80\xEF\xBF\xBF\xF0\x90\x80\x80\xF4\x8F\xBF\xBF";
+    std::vector<std::uint32_t> characters;
+    while (!text.empty()) {
+        characters.push_back(orva::TakeCharacter(text));
+    }
+    EXPECT_EQ(characters, (std::vector<std::uint32_t>{0x61, 0x7F, 0x80, 0x7FF, 0x800, 0xFFFF,
+                                                      0x10000, 0x10FFFF}));
 }
 
 }  // namespace
