@@ -1,4 +1,4 @@
-import { expect, openNew, rowOf, tab, test } from './support/test';
+import { expect, openNew, pick, rowOf, tab, test } from './support/test';
 
 test('what is missing is told at its field, and the first one gets the focus', async ({ app }) => {
     await openNew(app, 'Recycle bins');
@@ -48,6 +48,130 @@ test('a refusal of the appliance stands where it belongs, and nothing typed is l
     await expect(rowOf(app, 'Refused')).toBeVisible();
     const { data } = await appliance.call('get', { id: 9 });
     expect(data).toMatchObject({ extra: { script: 'echo kept' } });
+});
+
+test('a refused change stands where it belongs too, and changes nothing', async ({
+    app,
+    appliance,
+}) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Never stored');
+    await tab(app, 'Settings');
+    await app.route('**/set?*', async (route) => {
+        const body = JSON.parse(route.request().postData() ?? '{}') as object;
+        await route.continue({ postData: JSON.stringify({ ...body, schedule: { hour: 24 } }) });
+    });
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(app.getByRole('tab', { name: 'Schedule' })).toHaveAttribute(
+        'aria-selected',
+        'true',
+    );
+    await expect(app.getByText('Invalid (schedule) object (code 117)')).toBeVisible();
+    const { data } = await appliance.call('get', { id: 1 });
+    expect(data).toMatchObject({ name: 'Lunch signal', schedule: { hour: 12 } });
+    await app.unroute('**/set?*');
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(rowOf(app, 'Never stored')).toBeVisible();
+});
+
+test('a new recycle-bin task removes what is old; all at once comes with a warning', async ({
+    app,
+    appliance,
+}) => {
+    await openNew(app, 'Recycle bins');
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('One click');
+    await tab(app, 'Settings');
+    await expect(app.getByLabel('By age')).toBeChecked();
+    await expect(app.getByLabel('In the bin for more than')).toHaveValue('30');
+    const warning = app.getByText('Each start empties the bins');
+    await expect(warning).toHaveCount(0);
+    await app.getByLabel('Everything').check();
+    await expect(warning).toContainText('Each start empties the bins of all shares');
+    await app.getByLabel('Only these shares').check();
+    await expect(warning).toContainText('Each start empties the bins of these shares');
+    await app.getByLabel('All shares').check();
+    await app.getByLabel('By age').check();
+    await expect(warning).toHaveCount(0);
+    await app.getByRole('button', { name: 'Create task' }).click();
+    await expect(rowOf(app, 'One click')).toBeVisible();
+    const { data } = await appliance.call('get', { id: 9 });
+    expect(data).toMatchObject({
+        extra: {
+            clean_share_policy: { clean_all: true },
+            clean_file_policy: { policy: 'time', time: 30 },
+        },
+    });
+});
+
+test('a stored extension that the page would refuse is shown as it is, with the problem', async ({
+    app,
+    appliance,
+}) => {
+    const { data: old } = await appliance.call('get', { id: 4 });
+    const { extra } = old as { extra: { clean_file_policy: { reserve_policy: object } } };
+    Object.assign(extra.clean_file_policy.reserve_policy, {
+        extension_check: true,
+        extension: [{ file_ext: 'pdf' }, { file_ext: 'old files' }],
+    });
+    expect(await appliance.call('set', { ...old, extra })).toMatchObject({ success: true });
+
+    await app.getByRole('link', { name: 'Empty old bins' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Renamed');
+    await expect(app.getByRole('tab', { name: 'Settings' })).toContainText('needs a correction');
+    await app.getByRole('button', { name: 'Save' }).click();
+    const extensions = app.getByLabel(/^Extensions/);
+    await expect(extensions).toHaveValue('pdf, old files');
+    await expect(extensions).toBeFocused();
+    await expect(app.getByText('“old files” is no extension')).toBeVisible();
+    const kept = await appliance.call('get', { id: 4 });
+    expect(kept.data).toMatchObject({ name: 'Empty old bins', extra });
+
+    await extensions.fill('pdf, c++, a-b_c');
+    await app.getByRole('button', { name: 'Save' }).click();
+    await expect(rowOf(app, 'Renamed')).toBeVisible();
+    const { data } = await appliance.call('get', { id: 4 });
+    expect(data).toMatchObject({
+        extra: {
+            clean_file_policy: {
+                reserve_policy: {
+                    extension: [{ file_ext: 'pdf' }, { file_ext: 'c++' }, { file_ext: 'a-b_c' }],
+                },
+            },
+        },
+    });
+});
+
+test('that no buzzer can sound is said where a beep is made and where it is run', async ({
+    app,
+}) => {
+    let buzzer = false;
+    await app.route('**/info*', async (route) => {
+        const response = await route.fetch();
+        const answer = (await response.json()) as { data: object };
+        await route.fulfill({ response, json: { ...answer, data: { ...answer.data, buzzer } } });
+    });
+    await app.reload();
+    const notice = app.getByText('This appliance has no buzzer that can sound.');
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+    await expect(notice).toHaveCount(0);
+    await openNew(app, 'Beep');
+    for (const part of ['General', 'Schedule', 'Settings']) {
+        await tab(app, part);
+        await expect(notice).toBeVisible();
+    }
+    await app.getByRole('button', { name: 'Cancel' }).click();
+    await pick(app, 'Lunch signal', 'Run now');
+    await expect(app.getByRole('dialog').getByText('no buzzer')).toBeVisible();
+    await app.getByRole('dialog').getByRole('button', { name: 'Cancel' }).click();
+    await pick(app, 'Report free space', 'Run now');
+    await expect(app.getByRole('dialog')).toContainText('Report free space');
+    await expect(notice).toHaveCount(0);
+
+    buzzer = true;
+    await app.reload();
+    await pick(app, 'Lunch signal', 'Run now');
+    await expect(app.getByRole('dialog')).toContainText('Lunch signal');
+    await expect(notice).toHaveCount(0);
 });
 
 test('a task that another client deletes while it is edited cannot be saved', async ({

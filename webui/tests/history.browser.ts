@@ -1,3 +1,4 @@
+import { violations } from './support/axe';
 import { expect, pick, rowOf, runNow, test } from './support/test';
 
 test.use({ tasks: 'none' });
@@ -17,9 +18,65 @@ test('a running task shows what it prints, and can be stopped', async ({ app, ap
     ).toPass();
 
     await app.getByRole('button', { name: 'Stop Count up' }).click();
+    await expect(app.getByRole('dialog', { name: 'Stop Count up?' })).toBeVisible();
+    expect(await violations(app)).toEqual([]);
     await app.getByRole('dialog').getByRole('button', { name: 'Stop' }).click();
-    await expect(app.locator('td[data-label="Result"]')).toContainText('Ended by signal 15');
+    // A person wanted that: it is shown as no failure.
+    await expect(app.locator('td[data-label="Result"]')).toHaveText('Stopped by hand');
+    await expect(app.getByRole('img', { name: /^0 succeeded, 0 failed,? and 1 stopped/ })).toBeVisible();
+    await expect(app.locator('.orva-bar-stopped')).toHaveCount(1);
+    await expect(app.locator('.orva-outcome-failed')).toHaveCount(0);
     await expect(app.getByRole('button', { name: 'Stop Count up' })).toHaveCount(0);
+});
+
+test.describe('where one run goes on at a time', () => {
+    test.use({ settings: 'schedmaxruns="1"\n' });
+
+    test('one that waits can be stopped before it starts', async ({ app, appliance }) => {
+        await appliance.script('First', 'sleep 1000');
+        await appliance.script('Second', 'echo never');
+        await appliance.call('run', { task: [1, 2] });
+        await app.getByRole('link', { name: 'History' }).click();
+        const results = app.locator('td[data-label="Result"]');
+        await expect(results).toHaveText(['Waiting', 'Running']);
+        await app.getByRole('button', { name: 'Stop Second' }).click();
+        const dialog = app.getByRole('dialog', { name: 'Stop Second?' });
+        await expect(dialog).toContainText('It has not started yet');
+        await dialog.getByRole('button', { name: 'Stop' }).click();
+        await expect(results).toHaveText(['Stopped before it started', 'Running']);
+        await expect(app.getByRole('button', { name: /^Stop / })).toHaveCount(1);
+        await app.getByRole('button', { name: 'Stop First' }).click();
+        await app.getByRole('dialog').getByRole('button', { name: 'Stop' }).click();
+        await expect(results).toHaveText(['Stopped before it started', 'Stopped by hand']);
+    });
+});
+
+test('the history of a deleted task keeps its name, whatever of it is shown', async ({
+    app,
+    appliance,
+}) => {
+    await appliance.script('Gone for good', 'true');
+    await runNow(app, 'Gone for good');
+    await appliance.call('delete', { task: 1 });
+    await app.evaluate(() => {
+        window.location.hash = '#/history?task=1';
+    });
+    const heading = app.getByRole('heading', { name: 'History of Gone for good' });
+    await expect(heading).toBeVisible();
+    await app.getByRole('button', { name: 'State: All states' }).click();
+    await app.getByRole('menuitem', { name: 'Lost' }).click();
+    await expect(app.getByRole('heading', { name: 'No runs' })).toBeVisible();
+    await expect(heading).toBeVisible();
+    await expect(app).toHaveTitle(/^History of Gone for good/);
+});
+
+test('the history of a renamed task has its present name', async ({ app, appliance }) => {
+    const id = await appliance.script('Old name', 'true');
+    await runNow(app, 'Old name');
+    const { data } = await appliance.call('get', { id });
+    await appliance.call('set', { ...data, name: 'New name' });
+    await rowOf(app, 'New name').locator('td[data-label="Last result"] a').click();
+    await expect(app.getByRole('heading', { name: 'History of New name' })).toBeVisible();
 });
 
 test('of a long output the first and the last part are shown', async ({ app, appliance }) => {
@@ -53,7 +110,7 @@ test('the history of all tasks is filtered, charted and narrowed to one', async 
     await runNow(app, 'Good');
     await runNow(app, 'Bad');
     await app.getByRole('link', { name: 'History' }).click();
-    await expect(app.getByRole('img', { name: /1 succeeded, 1 failed/ })).toBeVisible();
+    await expect(app.getByRole('img', { name: /1 succeeded and 1 failed/ })).toBeVisible();
     await expect(app.locator('td[data-label="Result"]')).toHaveText([
         'Failed (exit status 1)',
         'Succeeded',

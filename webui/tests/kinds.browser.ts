@@ -91,14 +91,23 @@ test('a recycle-bin task is previewed, made, changed, run and deleted', async ({
     await app.getByLabel('public').check();
     await app.getByLabel('Switch on the bins').check();
     await app.getByLabel('By size').check();
+    // 0 would empty the bins: it is neither previewed nor saved.
+    const notYet = app.getByText('Correct what is marked above first.');
+    await app.getByLabel('Each bin may hold').fill('0');
+    await app.getByLabel('Each bin may hold').blur();
+    await expect(app.getByText('Enter a whole number from 1 to 4095.')).toBeVisible();
+    await expect(notYet).toBeVisible();
+    await expect(app.getByRole('button', { name: 'Show what would go' })).toBeDisabled();
     await app.getByLabel('Each bin may hold').fill('1');
+    await expect(notYet).toHaveCount(0);
     await app.getByLabel('Remove first').selectOption('The largest files');
     await app.getByLabel('Files with certain extensions').check();
-    const notYet = app.getByText('Correct what is marked above first.');
     await expect(notYet).toBeVisible();
     await app.getByLabel(/^Extensions/).fill('.pdf, docx');
     await expect(notYet).toHaveCount(0);
     await app.getByLabel('By age').check();
+    await app.getByLabel('In the bin for more than').fill('0');
+    await expect(notYet).toBeVisible();
     await app.getByLabel('In the bin for more than').fill('1');
     await app.getByRole('button', { name: 'Show what would go' }).click();
     await expect(app.getByText('0 files would be removed')).toBeVisible();
@@ -178,7 +187,14 @@ test('a task that starts again and again on a date is shown in words before it i
     await expect(starts.first()).toContainText('Moved by a clock change');
     await expect(starts.nth(1)).toHaveText('Wed, Apr 28, 2027, 2:30 AM');
 
+    // The hour that comes twice has starts in both passes.
+    await app.getByLabel(/^Date/).fill('2027-10-31');
     await app.getByLabel('Start again during the day').check();
+    for (const pass of ['first', 'second']) {
+        const note = `The clock shows this time twice: the ${pass}`;
+        await expect(starts.getByText(note, { exact: true })).toHaveCount(1);
+    }
+
     await app.getByLabel(/^Every\b/).fill('20');
     await app.getByLabel('Unit').selectOption('minutes');
     await app.getByLabel('Last start of the day').fill('02:00');

@@ -125,14 +125,39 @@ test('several tasks are changed together after a question that names them', asyn
 
     await app.getByRole('button', { name: 'Selected tasks' }).click();
     await app.getByRole('menuitem', { name: 'Delete' }).click();
+    await expect(dialog.getByRole('listitem')).toHaveText(['Report free space', 'Lunch signal']);
     await dialog.getByRole('button', { name: 'Cancel' }).click();
     await expect(app.getByText('2 selected')).toBeVisible();
     await app.getByRole('button', { name: 'Selected tasks' }).click();
     await app.getByRole('menuitem', { name: 'Delete' }).click();
     await dialog.getByRole('button', { name: 'Delete' }).click();
+    await expect(app.getByText('2 tasks are deleted')).toBeVisible();
     await expect(rowOf(app, 'Lunch signal')).toHaveCount(0);
+    await expect(rowOf(app, 'Report free space')).toHaveCount(0);
+    await expect(app.getByRole('button', { name: 'Selected tasks' })).toBeDisabled();
     const { data } = await appliance.call('list', {});
     expect(data).toMatchObject({ total: 6 });
+});
+
+test('several tasks are run together after a question that names them', async ({ app }) => {
+    await app.getByRole('checkbox', { name: 'Select Count documents' }).check();
+    await app.getByRole('checkbox', { name: 'Select Report free space' }).check();
+    await app.getByRole('checkbox', { name: 'Select Switch off on Fridays' }).check();
+    await app.getByRole('button', { name: 'Selected tasks' }).click();
+    await app.getByRole('menuitem', { name: 'Run now' }).click();
+    const dialog = app.getByRole('dialog', { name: 'Run these 2 tasks now?' });
+    await expect(
+        dialog.getByRole('list', { name: 'Run these 2 tasks now?' }).getByRole('listitem'),
+    ).toHaveText(['Report free space', 'Count documents']);
+    await expect(dialog.getByRole('list', { name: 'Left out' })).toHaveText(
+        'Switch off on Fridays',
+    );
+    await dialog.getByRole('button', { name: 'Run now' }).click();
+    await expect(app.getByText('2 tasks are started')).toBeVisible();
+    const result = (name: string) => rowOf(app, name).locator('td[data-label="Last result"]');
+    await expect(result('Count documents')).toContainText('Succeeded');
+    await expect(result('Report free space')).toContainText('Succeeded');
+    await expect(result('Switch off on Fridays')).toHaveText('Never ran');
 });
 
 test('what may not be done is left out, with the reason', async ({ app }) => {

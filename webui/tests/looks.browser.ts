@@ -1,13 +1,23 @@
 import { join } from 'node:path';
 
-import type { Page } from '@playwright/test';
+import type { Locator, Page } from '@playwright/test';
 
 import { pictureFolder } from './support/places';
-import { choose, expect, runNow, tab, test } from './support/test';
+import { choose, expect, rowOf, runNow, tab, test } from './support/test';
 import { VIEWS } from './support/views';
 
-async function widthOf(page: Page): Promise<number> {
-    return page.evaluate(() => document.documentElement.scrollWidth);
+const VIEWS_OF_THE_WINDOW =
+    'html, .orva-window-view, [class*="page__main"], .pf-v6-c-modal-box, .pf-v6-c-modal-box__body';
+
+/** What of the window has to be scrolled sideways to be seen whole. */
+async function tooWide(page: Page): Promise<string[]> {
+    return page
+        .locator(VIEWS_OF_THE_WINDOW)
+        .evaluateAll((elements) =>
+            elements
+                .filter((element) => element.scrollWidth > element.clientWidth)
+                .map((element) => `${element.className || element.tagName} ${element.scrollWidth}`),
+        );
 }
 
 test('the colours follow the system and the switch', async ({ app }) => {
@@ -31,9 +41,59 @@ test.describe('on a phone', () => {
         await runNow(app, 'Speak');
         for (const view of VIEWS) {
             await view.open(app);
-            expect([view.name, await widthOf(app)]).toEqual([view.name, 390]);
+            expect([view.name, ...(await tooWide(app))]).toEqual([view.name]);
             await app.screenshot({ path: join(pictureFolder, `phone-${view.name}.png`) });
+            await view.close?.(app);
         }
+    });
+
+    const middle = async (place: Locator) => {
+        const box = await place.boundingBox();
+        return (box?.y ?? 0) + (box?.height ?? 0) / 2;
+    };
+
+    test('a card begins with its name', async ({
+        app,
+    }) => {
+        const row = rowOf(app, 'Report free space');
+        const name = await middle(row.locator('td[data-label="Name"]'));
+        for (const other of await row.locator('td[data-label]:not([data-label="Name"])').all()) {
+            expect(await middle(other)).toBeGreaterThan(name);
+        }
+    });
+
+    for (const language of ['English', 'Deutsch', '日本語']) {
+        test(`what belongs on one line stands there in ${language}`, async ({ app, appliance }) => {
+            await appliance.script('Late', 'true', {
+                schedule: { mode: 'date', date: '2027-09-29', hour: 22, minute: 55 },
+            });
+            await appliance.call('run', { task: 2 });
+            await app.getByRole('button', { name: 'Language: English' }).tap();
+            await app.getByRole('menuitem', { name: language }).tap();
+            const title = await middle(app.getByRole('heading', { level: 1 }));
+            const button = await middle(app.locator('.orva-head button'));
+            expect(Math.abs(title - button)).toBeLessThan(5);
+            for (const name of ['Late', 'Back up documents']) {
+                const cell = rowOf(app, name).locator('td').nth(6);
+                const [day, time] = await cell.locator('.orva-nowrap').all();
+                expect(await middle(day ?? cell)).toBe(await middle(time ?? cell));
+            }
+            const when = rowOf(app, 'Report free space').locator('.orva-last-result .orva-subtle');
+            await expect(when).toBeVisible();
+            expect((await when.boundingBox())?.height).toBeLessThan(25);
+        });
+    }
+
+    test('the run that is opened from the list is seen with what it printed', async ({
+        app,
+        appliance,
+    }) => {
+        await appliance.script('Speak', 'seq 14; echo the last line');
+        await runNow(app, 'Speak');
+        await rowOf(app, 'Speak').locator('td[data-label="Last result"] a').tap();
+        const output = app.getByRole('region', { name: 'Output' });
+        await expect(output).toContainText('the last line');
+        await expect(output).toBeInViewport({ ratio: 1 });
     });
 
     test('a task is made and the list sorted', async ({ app }) => {
@@ -64,6 +124,7 @@ test('pictures of the main views are taken', async ({ app, appliance }) => {
             await view.open(app);
             await app.evaluate(() => (document.activeElement as HTMLElement | null)?.blur());
             await app.screenshot({ path: join(pictureFolder, `${colours}-${view.name}.png`) });
+            await view.close?.(app);
         }
     }
 });

@@ -1,6 +1,7 @@
 import type { Page } from '@playwright/test';
 
-import { expect, openNew, tab, test } from './support/test';
+import { violations } from './support/axe';
+import { expect, openNew, rowOf, runNow, tab, test } from './support/test';
 
 async function signIn(page: Page, token: string): Promise<void> {
     await page.getByLabel('Access token').fill(token);
@@ -54,6 +55,47 @@ test('guessing is slowed down', async ({ page, appliance }) => {
     }
     await signIn(page, 'guess 6');
     await expect(page.getByText('Too many wrong attempts.')).toBeVisible();
+    const wait = page.getByRole('timer');
+    await expect(wait).toHaveText(/^Try again in \d\d seconds\.$/);
+    expect(await violations(page)).toEqual([]);
+    const seconds = async () => Number(/\d+/.exec(await wait.innerText())?.[0]);
+    const first = await seconds();
+    expect(first).toBeLessThanOrEqual(60);
+    await expect(async () => expect(await seconds()).toBeLessThan(first - 1)).toPass();
+
+    // A sign-in link is looked at no more than a token, and is not used up.
+    const link = appliance.link();
+    await page.goto('about:blank');
+    await page.goto(link);
+    await expect(wait).toHaveText(/^Try again in \d+ seconds?\.$/);
+    await expect(page.getByText('has been used')).toHaveCount(0);
+});
+
+test.describe('by TLS', () => {
+    test.use({ tls: true, ignoreHTTPSErrors: true });
+
+    test('a person signs in, works and signs out, and the cookie is for TLS alone', async ({
+        page,
+        appliance,
+    }) => {
+        expect(appliance.url).toMatch(/^https:/);
+        await page.goto(appliance.url);
+        await signIn(page, appliance.token);
+        await expect(page.getByRole('heading', { name: 'Scheduled tasks' })).toBeVisible();
+        const cookies = await page.context().cookies();
+        expect(cookies).toMatchObject([
+            { name: 'orva_session', secure: true, httpOnly: true, sameSite: 'Strict', path: '/' },
+        ]);
+
+        await expect(await runNow(page, 'Report free space')).toContainText('Succeeded');
+        await rowOf(page, 'Report free space').locator('td[data-label="Last result"] a').click();
+        await expect(page.getByRole('region', { name: 'Output' })).toContainText('Filesystem');
+        await page.getByRole('button', { name: 'Sign out' }).click();
+        await expect(page.getByLabel('Access token')).toBeVisible();
+
+        await page.goto(appliance.link());
+        await expect(page.getByRole('heading', { name: 'Scheduled tasks' })).toBeVisible();
+    });
 });
 
 test('when the session ends, what was typed stays', async ({ app, appliance }) => {
@@ -64,6 +106,7 @@ test('when the session ends, what was typed stays', async ({ app, appliance }) =
     await app.context().clearCookies();
     const dialog = app.getByRole('dialog', { name: 'Your session has ended' });
     await expect(dialog).toBeVisible();
+    expect(await violations(app)).toEqual([]);
     await dialog.getByLabel('Access token').fill(appliance.token);
     await dialog.getByRole('button', { name: 'Sign in' }).click();
     await expect(dialog).toHaveCount(0);

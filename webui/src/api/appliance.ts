@@ -47,6 +47,12 @@ export interface CleanPreview {
     problems?: string[];
 }
 
+export interface Revision {
+    revision: number;
+    /** Whether one is alive; an older appliance tells it with its state only. */
+    scheduler?: boolean;
+}
+
 export function listShares(signal?: AbortSignal) {
     return call<{ shares: Share[] }>(API, 'shares', {}, signal);
 }
@@ -64,7 +70,7 @@ export function readInfo(signal?: AbortSignal) {
 }
 
 export function readRevision(signal?: AbortSignal) {
-    return call<{ revision: number }>(API, 'revision', {}, signal);
+    return call<Revision>(API, 'revision', {}, signal);
 }
 
 export function previewClean(rules: CleanRules, signal?: AbortSignal) {

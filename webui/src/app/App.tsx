@@ -17,7 +17,13 @@ function Inside() {
                 </Bullseye>
             );
         case 'out':
-            return <SignInPage onSignedIn={session.entered} notice={session.notice} />;
+            return (
+                <SignInPage
+                    onSignedIn={session.entered}
+                    notice={session.notice}
+                    wait={session.wait}
+                />
+            );
         default:
             return (
                 <>

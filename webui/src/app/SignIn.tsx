@@ -14,23 +14,57 @@ import {
 import { type FormEvent, useEffect, useRef, useState } from 'react';
 
 import { signIn } from '../api/session';
+import { useNow } from '../live/useNow';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
 import { Preferences } from './Preferences';
 import { Notice } from '../ui/Notice';
 
+const SECOND = 1000;
+
 interface Props {
     onSignedIn(): void;
     /** Said above the form: why it is shown. */
     notice?: string;
+    /** Seconds that begin with the form, in which no token is looked at. */
+    wait?: number;
+}
+
+interface Countdown {
+    /** By the browser's clock. */
+    end: number;
+    seconds: number;
+}
+
+function countdownOf(seconds: number): Countdown | null {
+    return seconds > 0 ? { end: Date.now() + seconds * SECOND, seconds } : null;
+}
+
+/** The seconds that are left of `begin`, down to 0, and a way to begin anew. */
+function useCountdown(begin: number): [number, (seconds: number) => void] {
+    const [countdown, setCountdown] = useState(() => countdownOf(begin));
+    const now = useNow(countdown !== null);
+    useEffect(() => {
+        if (!countdown) {
+            return;
+        }
+        const timer = setTimeout(() => setCountdown(null), countdown.end - Date.now());
+        return () => clearTimeout(timer);
+    }, [countdown]);
+    // The clock that is shown goes in steps, behind the one that ends this.
+    const left = countdown
+        ? Math.min(countdown.seconds, Math.ceil((countdown.end - now) / SECOND))
+        : 0;
+    return [left, (seconds) => setCountdown(countdownOf(seconds))];
 }
 
 /** Asks for the token. */
-export function SignInForm({ onSignedIn, notice }: Props) {
+export function SignInForm({ onSignedIn, notice, wait: begin = 0 }: Props) {
     const { t } = useTexts();
     const [token, setToken] = useState('');
     const [problem, setProblem] = useState('');
     const [busy, setBusy] = useState(false);
+    const [wait, startWait] = useCountdown(begin);
     const input = useRef<HTMLInputElement>(null);
 
     useEffect(() => input.current?.focus(), []);
@@ -47,11 +81,15 @@ export function SignInForm({ onSignedIn, notice }: Props) {
         setProblem('');
         try {
             const result = await signIn({ token: given });
-            if (result === 'ok') {
+            if (result.state === 'ok') {
                 onSignedIn();
                 return;
             }
-            setProblem(t(result === 'refused' ? 'signin.refused' : 'signin.tooMany'));
+            if (result.state === 'refused') {
+                setProblem(t('signin.refused'));
+            } else {
+                startWait(result.seconds);
+            }
         } catch (error) {
             setProblem(errorText(error, t));
         }
@@ -70,16 +108,24 @@ export function SignInForm({ onSignedIn, notice }: Props) {
                     autoComplete="current-password"
                     value={token}
                     onChange={(_event, value) => setToken(value)}
-                    validated={problem ? 'error' : 'default'}
+                    validated={problem || wait > 0 ? 'error' : 'default'}
                     aria-describedby="token-help"
                 />
                 <FormHelperText>
                     <HelperText id="token-help" aria-live="polite">
                         <HelperTextItem
-                            variant={problem ? 'error' : 'default'}
+                            variant={problem || wait > 0 ? 'error' : 'default'}
                             screenReaderText=""
                         >
-                            {problem || t('signin.help')}
+                            {wait > 0 ? (
+                                <>
+                                    {t('signin.tooMany')}{' '}
+                                    {/* Not read out again every second. */}
+                                    <span role="timer">{t.count('signin.wait', wait)}</span>
+                                </>
+                            ) : (
+                                problem || t('signin.help')
+                            )}
                         </HelperTextItem>
                     </HelperText>
                 </FormHelperText>

@@ -1,7 +1,7 @@
 import { useCallback, useEffect, useState } from 'react';
 
 import { onSignedOut } from '../api/client';
-import { isSignedIn, signIn, signOut } from '../api/session';
+import { isSignedIn, signIn, type SignInResult, signOut } from '../api/session';
 import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
@@ -13,6 +13,8 @@ export interface Session {
     state: SessionState;
     /** Why the sign-in is shown, when there is something to say. */
     notice: string;
+    /** For so many seconds the appliance looks at no token. */
+    wait: number;
     entered(): void;
     leave(): void;
 }
@@ -28,14 +30,15 @@ function takeCode(): string | null {
 
 const linkCode = takeCode();
 
-async function enterWithLink(): Promise<boolean> {
-    return linkCode !== null && (await signIn({ code: decodeURIComponent(linkCode) })) === 'ok';
+async function enterWithLink(): Promise<SignInResult | null> {
+    return linkCode === null ? null : signIn({ code: decodeURIComponent(linkCode) });
 }
 
 export function useSession(): Session {
     const { t } = useTexts();
     const [state, setState] = useState<SessionState>('checking');
     const [notice, setNotice] = useState('');
+    const [wait, setWait] = useState(0);
 
     const entered = useCallback(() => {
         setNotice('');
@@ -49,7 +52,7 @@ export function useSession(): Session {
         let current = true;
         const begin = async () => {
             const byLink = await enterWithLink();
-            const inside = byLink || (await isSignedIn());
+            const inside = byLink?.state === 'ok' || (await isSignedIn());
             if (!current) {
                 return;
             }
@@ -57,7 +60,8 @@ export function useSession(): Session {
                 entered();
                 return;
             }
-            setNotice(linkCode === null ? '' : 'signin.linkUsed');
+            setNotice(byLink?.state === 'refused' ? 'signin.linkUsed' : '');
+            setWait(byLink?.state === 'too-many' ? byLink.seconds : 0);
             setState('out');
         };
         begin().catch((error: unknown) => {
@@ -87,6 +91,7 @@ export function useSession(): Session {
     return {
         state,
         notice: notice === 'signin.linkUsed' ? t('signin.linkUsed') : notice,
+        wait,
         entered,
         leave,
     };

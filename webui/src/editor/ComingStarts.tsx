@@ -5,6 +5,7 @@ import { ApiError } from '../api/client';
 import { type ComingStart, comingStarts } from '../api/history';
 import { useQuery, useSettled } from '../live/useQuery';
 import { useTexts } from '../texts/TextsProvider';
+import type { Translate } from '../texts/translate';
 import { errorText } from '../ui/errorText';
 import { type ScheduleForm, scheduleDocument } from './schedule';
 import { scheduleWords } from './scheduleWords';
@@ -19,6 +20,17 @@ interface Props {
     onRefused(message: string | null): void;
 }
 
+/** What the appliance notes about a start, by the words that each note ends with or begins with. */
+function noteText(note: string, t: Translate): string {
+    if (note.startsWith('moved')) {
+        return t('starts.moved');
+    }
+    if (note.endsWith('the first of them')) {
+        return t('starts.firstOfTwo');
+    }
+    return note.endsWith('the second of them') ? t('starts.secondOfTwo') : note;
+}
+
 function Start({ start }: { start: ComingStart }) {
     const { t, format } = useTexts();
     return (
@@ -27,8 +39,8 @@ function Start({ start }: { start: ComingStart }) {
             {start.note !== '' && (
                 <>
                     {' '}
-                    <Label color="orange" isCompact title={start.note}>
-                        {start.note.startsWith('moved') ? t('starts.moved') : start.note}
+                    <Label color="orange" isCompact>
+                        {noteText(start.note, t)}
                     </Label>
                 </>
             )}

@@ -11,10 +11,11 @@ import {
 
 import { REPEATS, type Repeat } from '../api/tasks';
 import { useTexts } from '../texts/TextsProvider';
+import { ClockField } from './ClockField';
 import { ComingStarts } from './ComingStarts';
 import { Field } from './fields';
 import { fieldId } from './problems';
-import type { ScheduleForm } from './schedule';
+import { isDate, type ScheduleForm } from './schedule';
 import { usesLastDay } from './scheduleWords';
 
 interface Props {
@@ -64,10 +65,16 @@ function WeekDays({ form, onChange }: PartProps) {
 }
 
 function DateFields({ form, onChange }: PartProps) {
-    const { t } = useTexts();
+    const { t, format } = useTexts();
     return (
         <>
-            <Field field="schedule.date" label={t('schedule.date')} isRequired>
+            {/* The browser's input orders day and month in its own way: the words say which is which. */}
+            <Field
+                field="schedule.date"
+                label={t('schedule.date')}
+                help={isDate(form.date) ? format.dateWithDay(form.date) : undefined}
+                isRequired
+            >
                 {(input) => (
                     <TextInput
                         {...input}
@@ -103,28 +110,6 @@ function DateFields({ form, onChange }: PartProps) {
                 )}
             </Field>
         </>
-    );
-}
-
-function ClockField(props: {
-    field: string;
-    label: string;
-    value: string;
-    help?: string;
-    onChange(value: string): void;
-}) {
-    return (
-        <Field field={props.field} label={props.label} help={props.help} isRequired>
-            {(input) => (
-                <TextInput
-                    {...input}
-                    type="time"
-                    className="orva-short"
-                    value={props.value}
-                    onChange={(_event, value) => props.onChange(value)}
-                />
-            )}
-        </Field>
     );
 }
 

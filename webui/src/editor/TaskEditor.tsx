@@ -132,6 +132,7 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
                     }}
                 />
             )}
+            {kind.Remark && <kind.Remark />}
             <Form onSubmit={(event) => void save(event)} noValidate className="orva-editor">
                 <Tabs
                     activeKey={tab}

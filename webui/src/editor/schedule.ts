@@ -1,4 +1,5 @@
 import type { Repeat, ScheduleDocument } from '../api/tasks';
+import { clockText, minutesOf } from './clock';
 import { collect, numberProblem, type Problems, wholeNumber } from './problems';
 
 /** The schedule as it is typed. Numbers are texts, so that nothing typed is lost. */
@@ -9,7 +10,7 @@ export interface ScheduleForm {
     /** "YYYY-MM-DD". */
     date: string;
     repeat: Repeat;
-    /** "HH:MM", like `last`. */
+    /** "HH:MM", like `last`; or what was typed, when that is no time. */
     time: string;
     often: 'once' | 'interval';
     every: string;
@@ -20,18 +21,6 @@ export interface ScheduleForm {
 
 const LONGEST_INTERVAL = 24 * 60 - 1;
 const USUAL_INTERVAL = 60;
-
-function clock(hour: number, minute: number): string {
-    return `${String(hour).padStart(2, '0')}:${String(minute).padStart(2, '0')}`;
-}
-
-/** Minutes after midnight of "HH:MM"; null for anything else. */
-export function minutesOf(time: string): number | null {
-    const parts = /^(\d\d):(\d\d)$/.exec(time);
-    const hour = Number(parts?.[1]);
-    const minute = Number(parts?.[2]);
-    return parts && hour < 24 && minute < 60 ? hour * 60 + minute : null;
-}
 
 export function isDate(text: string): boolean {
     const parts = /^(\d{4})-(\d\d)-(\d\d)$/.exec(text);
@@ -51,11 +40,11 @@ export function scheduleForm(document: ScheduleDocument): ScheduleForm {
         days: Array.from({ length: 7 }, (_, day) => days.has(String(day))),
         date: document.date,
         repeat: document.repeat_date,
-        time: clock(document.hour, document.minute),
+        time: clockText(document.hour, document.minute),
         often: document.interval_min > 0 ? 'interval' : 'once',
         every: String(hours ? interval / 60 : interval),
         unit: hours ? 'hours' : 'minutes',
-        last: clock(document.last_hour, document.last_min),
+        last: clockText(document.last_hour, document.last_min),
         runMissed: document.run_missed,
     };
 }

@@ -1,6 +1,7 @@
 import type { Format } from '../texts/format';
 import type { Translate } from '../texts/translate';
-import { intervalOf, minutesOf, type ScheduleForm } from './schedule';
+import { minutesOf } from './clock';
+import { intervalOf, type ScheduleForm } from './schedule';
 
 const WORK_DAYS = [false, true, true, true, true, true, false];
 const WEEKEND = [true, false, false, false, false, false, true];

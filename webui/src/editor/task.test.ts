@@ -59,6 +59,12 @@ describe('a task', () => {
         expect(taskChange(taskForm(blank, BEEP), blank, BEEP)).not.toHaveProperty('id');
     });
 
+    it('begins with what its kind proposes, and only when it is new', () => {
+        const kind = { ...BEEP, toNewForm: () => ({ duration: '5' }) };
+        expect(taskForm({ ...LUNCH, id: -1 }, kind).extra).toEqual({ duration: '5' });
+        expect(taskForm(LUNCH, kind).extra).toEqual({ duration: '2' });
+    });
+
     it('of another application gives back its settings as they came', () => {
         const backup = { ...LUNCH, type: 'backup', extra: null };
         expect(taskChange(taskForm(backup, OTHER), backup, OTHER).extra).toBeNull();

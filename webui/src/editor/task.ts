@@ -21,20 +21,27 @@ export interface TaskForm {
 
 const LONGEST_NAME = 255;
 
+/** A blank form has the number -1. */
+export function isStored(document: TaskDocument): boolean {
+    return document.id > 0;
+}
+
 export function taskForm(document: TaskDocument, kind: Kind): TaskForm {
     return {
         name: document.name,
         enable: document.enable,
         owner: document.owner,
         schedule: scheduleForm(document.schedule),
-        extra: kind.toForm(document.extra),
+        extra: isStored(document)
+            ? kind.toForm(document.extra)
+            : (kind.toNewForm ?? kind.toForm)(document.extra),
     };
 }
 
 /** What is sent; for a form without problems. `document` is what the form began with. */
 export function taskChange(form: TaskForm, document: TaskDocument, kind: Kind): TaskChange {
     return {
-        ...(document.id > 0 && { id: document.id }),
+        ...(isStored(document) && { id: document.id }),
         name: form.name,
         owner: form.owner,
         enable: form.enable,

@@ -6,7 +6,15 @@ import { live } from '../live/live';
 import type { Kind } from './kinds/kind';
 import type { Problem, Problems, Tab } from './problems';
 import { fieldId, TABS, tabOf } from './problems';
-import { placeOf, type Refusal, taskChange, type TaskForm, taskForm, taskProblems } from './task';
+import {
+    isStored,
+    placeOf,
+    type Refusal,
+    taskChange,
+    type TaskForm,
+    taskForm,
+    taskProblems,
+} from './task';
 
 interface ApiRefusal extends Refusal {
     error: ApiError;
@@ -42,12 +50,18 @@ function focusSoon(field: string): void {
     });
 }
 
+function wrongIn(document: TaskDocument, kind: Kind): ReadonlySet<string> {
+    const problems = isStored(document) ? taskProblems(taskForm(document, kind), kind) : {};
+    return new Set(Object.keys(problems));
+}
+
 export function useTaskEditor(begin: TaskDocument, kind: Kind): TaskEditor {
     const [base, setBase] = useState(begin);
     const initial = useMemo(() => taskForm(base, kind), [base, kind]);
     const [form, setForm] = useState(initial);
     const [tab, setTab] = useState<Tab>('general');
-    const [touched, setTouched] = useState<ReadonlySet<string>>(new Set());
+    // What is wrong with a stored task is shown from the start.
+    const [touched, setTouched] = useState<ReadonlySet<string>>(() => wrongIn(begin, kind));
     const [attempted, setAttempted] = useState(false);
     const [busy, setBusy] = useState(false);
     const [refusal, setRefusal] = useState<ApiRefusal | null>(null);
@@ -133,6 +147,7 @@ export function useTaskEditor(begin: TaskDocument, kind: Kind): TaskEditor {
     const load = (document: TaskDocument) => {
         setBase(document);
         setForm(taskForm(document, kind));
+        setTouched(wrongIn(document, kind));
         setRefusal(null);
         setAttempted(false);
     };

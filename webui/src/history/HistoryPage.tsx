@@ -10,7 +10,8 @@ import {
 import ListIcon from '@patternfly/react-icons/dist/esm/icons/list-icon';
 import { useEffect, useMemo } from 'react';
 
-import { listRuns, RUN_STATES } from '../api/history';
+import { ApiError } from '../api/client';
+import { listRuns, type Run, RUN_STATES } from '../api/history';
 import { getTask } from '../api/tasks';
 import type { ViewProps } from '../app/CurrentView';
 import { useRoute } from '../app/route';
@@ -33,16 +34,30 @@ function useRuns(view: HistoryView) {
     return useQuery(JSON.stringify(query), (signal) => listRuns(query, signal));
 }
 
-/** What the title calls the task whose runs are shown; a task without any is asked for its name. */
-function useTaskName(task: number | null, nameOfRun: string | null): string | null {
-    const asked = useQuery(
-        task !== null && nameOfRun === null ? `name ${task}` : null,
-        (signal) => getTask(task ?? 0, signal),
-    );
+/** The task's name; of one that is gone, what it was called when it ran last. */
+async function nameOf(task: number, signal: AbortSignal): Promise<string | null> {
+    try {
+        return (await getTask(task, signal)).name;
+    } catch (error) {
+        if (!(error instanceof ApiError)) {
+            throw error;
+        }
+        const { runs } = await listRuns({ task, limit: 1 }, signal);
+        return runs[0]?.name ?? null;
+    }
+}
+
+/** What the title calls the task whose runs are shown; null when they are of all tasks. */
+function useTaskName(task: number | null, runs: Run[]): string | null {
+    const asked = useQuery(task === null ? null : `name ${task}`, async (signal) => ({
+        task,
+        name: await nameOf(task ?? 0, signal),
+    }));
     if (task === null) {
         return null;
     }
-    return nameOfRun ?? (asked.data?.id === task ? asked.data.name : `${task}`);
+    const known = asked.data?.task === task ? asked.data.name : null;
+    return known ?? runs.find((run) => run.task === task)?.name ?? `${task}`;
 }
 
 function NoRuns({ filtered }: { filtered: boolean }) {
@@ -64,7 +79,7 @@ export function HistoryPage({ onTitle }: ViewProps) {
     const change = (part: Partial<HistoryView>) => showHistory({ ...view, ...part });
 
     const runs = data?.runs ?? [];
-    const name = useTaskName(view.task, data && (runs[0]?.name ?? null));
+    const name = useTaskName(view.task, runs);
     const title = name === null ? t('history.title') : t('history.titleOf', { name });
     useEffect(() => onTitle(title), [onTitle, title]);
 

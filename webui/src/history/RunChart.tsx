@@ -1,6 +1,6 @@
 import type { Run } from '../api/history';
 import { useTexts } from '../texts/TextsProvider';
-import { outcomeOf, resultText, runLength } from './result';
+import { type Outcome, outcomeOf, resultText, runLength } from './result';
 
 const HEIGHT = 60;
 const BAR = 10;
@@ -11,12 +11,16 @@ const LEAST = 3;
 export function RunChart({ runs }: { runs: Run[] }) {
     const { t, format } = useTexts();
     const shown = runs.toReversed().map((run) => ({ run, length: runLength(run, Date.now()) ?? 0 }));
-    const longest = Math.max(1, ...shown.map(({ length }) => length));
-    const good = runs.filter((run) => outcomeOf(run) === 'ok').length;
-    const bad = runs.filter((run) => outcomeOf(run) === 'failed').length;
+    const longest = Math.max(0, ...shown.map(({ length }) => length));
+    const count = (outcome: Outcome) => runs.filter((run) => outcomeOf(run) === outcome).length;
+    const stopped = count('stopped');
+    const counts = [
+        t.count('chart.good', count('ok')),
+        t.count('chart.bad', count('failed')),
+        ...(stopped > 0 ? [t.count('chart.stopped', stopped)] : []),
+    ];
     const summary = t('chart.summary', {
-        good: t.count('chart.good', good),
-        bad: t.count('chart.bad', bad),
+        counts: format.list(counts),
         longest: format.length(longest),
     });
     return (
@@ -29,7 +33,7 @@ export function RunChart({ runs }: { runs: Run[] }) {
                 aria-label={summary}
             >
                 {shown.map(({ run, length }, index) => {
-                    const height = Math.max(LEAST, Math.round((length / longest) * HEIGHT));
+                    const height = Math.max(LEAST, Math.round((length / (longest || 1)) * HEIGHT));
                     return (
                         <rect
                             key={run.run}

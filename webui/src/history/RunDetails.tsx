@@ -1,4 +1,4 @@
-import { useEffect, useState } from 'react';
+import { useEffect, useRef, useState } from 'react';
 
 import { type Run, runOutput } from '../api/history';
 import { PERIOD, useLive } from '../live/live';
@@ -42,8 +42,17 @@ export function RunDetails({ run }: { run: Run }) {
     const { data, error } = useQuery(`${run.run} ${run.state} ${beat}`, (signal) =>
         runOutput(run.run, signal),
     );
+    // Whole as far as it fits: on a phone what was opened may begin below the edge.
+    const place = useRef<HTMLDivElement>(null);
+    const arrived = data !== null || error !== null;
+    useEffect(() => {
+        if (arrived) {
+            place.current?.closest('tbody')?.scrollIntoView({ block: 'nearest' });
+        }
+    }, [arrived]);
+
     return (
-        <div className="orva-details">
+        <div className="orva-details" ref={place}>
             <dl className="orva-facts">
                 <dt>{t('history.run')}</dt>
                 <dd>{run.run}</dd>

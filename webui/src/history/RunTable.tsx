@@ -7,7 +7,7 @@ import { useState } from 'react';
 import type { Run } from '../api/history';
 import { useNow } from '../live/useNow';
 import { useTexts } from '../texts/TextsProvider';
-import { ResultLabel, runLength, whyText } from './result';
+import { reasonText, ResultLabel, runLength } from './result';
 import { RunDetails } from './RunDetails';
 import { StopRun } from './StopRun';
 
@@ -27,7 +27,7 @@ function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
     const running = run.state === 'running';
     const now = useNow(running);
     const length = runLength(run, now);
-    const why = run.why ? whyText(run.why, t) : '';
+    const why = reasonText(run, t);
     return (
         <Tbody isExpanded={isOpen}>
             <Tr>
@@ -45,7 +45,11 @@ function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
                     {why && <div className="orva-subtle">{why}</div>}
                 </Td>
                 {!oneTask && (
-                    <Td dataLabel={t('history.task')} modifier="breakWord">
+                    <Td
+                        dataLabel={t('history.task')}
+                        modifier="breakWord"
+                        className="orva-card-title"
+                    >
                         <Button variant="link" isInline onClick={() => onTask(run.task)}>
                             {run.name}
                         </Button>
@@ -59,7 +63,7 @@ function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
                 </Td>
                 <Td dataLabel={t('history.reason')}>{t(`reason.${run.reason}`)}</Td>
                 <Td isActionCell>
-                    {running && (
+                    {(running || run.state === 'queued') && (
                         <Button
                             variant="secondary"
                             size="sm"
@@ -85,7 +89,12 @@ export function RunTable(props: Props) {
     const [stopping, setStopping] = useState<Run | null>(null);
     return (
         <>
-            <Table aria-label={t('history.title')} variant="compact" gridBreakPoint="grid-md">
+            <Table
+                aria-label={t('history.title')}
+                variant="compact"
+                gridBreakPoint="grid-md"
+                className="orva-cards"
+            >
                 <Thead>
                     <Tr>
                         <Th screenReaderText={t('history.output')} />

@@ -32,7 +32,7 @@ export function StopRun({ run, onClose }: { run: Run; onClose(): void }) {
             <ModalHeader title={t('stop.title', { name: run.name })} labelId="stop-title" />
             <ModalBody>
                 {failure && <Notice variant="danger" title={failure} />}
-                {t('stop.body')}
+                {t(run.state === 'queued' ? 'stop.queued' : 'stop.body')}
             </ModalBody>
             <ModalFooter>
                 <Button variant="danger" isLoading={busy} isDisabled={busy} onClick={() => void stop()}>

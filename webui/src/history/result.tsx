@@ -4,6 +4,7 @@ import ExclamationCircleIcon from '@patternfly/react-icons/dist/esm/icons/exclam
 import InProgressIcon from '@patternfly/react-icons/dist/esm/icons/in-progress-icon';
 import PendingIcon from '@patternfly/react-icons/dist/esm/icons/pending-icon';
 import QuestionCircleIcon from '@patternfly/react-icons/dist/esm/icons/question-circle-icon';
+import StopCircleIcon from '@patternfly/react-icons/dist/esm/icons/stop-circle-icon';
 import type { ComponentType } from 'react';
 
 import type { Run } from '../api/history';
@@ -12,9 +13,15 @@ import type { TextKey } from '../texts/language';
 import type { Translate } from '../texts/translate';
 
 /** How a run stands or ended, as a person judges it. */
-export type Outcome = 'ok' | 'failed' | 'running' | 'queued' | 'skipped' | 'lost';
+export type Outcome = 'ok' | 'failed' | 'stopped' | 'running' | 'queued' | 'skipped' | 'lost';
+
+/** What the scheduler gives as reason when a person stopped the run, before or after its start. */
+const STOPPED = 'stopped';
 
 export function outcomeOf(run: Run): Outcome {
+    if (run.why === STOPPED && (run.state === 'ended' || run.state === 'skipped')) {
+        return 'stopped';
+    }
     if (run.state !== 'ended') {
         return run.state;
     }
@@ -23,6 +30,9 @@ export function outcomeOf(run: Run): Outcome {
 
 export function resultText(run: Run, t: Translate): string {
     const outcome = outcomeOf(run);
+    if (outcome === 'stopped' && run.state === 'skipped') {
+        return t('outcome.cancelled');
+    }
     if (outcome !== 'failed') {
         return t(`outcome.${outcome}`);
     }
@@ -32,6 +42,11 @@ export function resultText(run: Run, t: Translate): string {
     return run.signal !== null
         ? t('outcome.signal', { signal: run.signal })
         : t('outcome.notStarted');
+}
+
+/** Why the run went as it did, where its result does not say so already. */
+export function reasonText(run: Run, t: Translate): string {
+    return outcomeOf(run) === 'stopped' ? '' : whyText(run.why, t);
 }
 
 /** The scheduler's own reasons, by their first words; what it does not know it says as it came. */
@@ -44,7 +59,10 @@ const REASONS: readonly [string, TextKey][] = [
     ['clock not trusted', 'why.clock'],
     ['not permitted', 'why.notPermitted'],
     ['the owner is gone', 'why.ownerGone'],
+    ['the owner cannot be looked up', 'why.ownerUnknown'],
+    ['cannot become the owner', 'why.notOwner'],
     ['no space for output', 'why.noSpace'],
+    ['cannot keep output', 'why.noOutput'],
     ['cannot start a shell', 'why.noShell'],
     ['cannot start', 'why.cannotStart'],
     ['no command', 'why.noCommand'],
@@ -64,6 +82,7 @@ export function whyText(why: string, t: Translate): string {
 const ICONS: Record<Outcome, ComponentType<{ className?: string }>> = {
     ok: CheckCircleIcon,
     failed: ExclamationCircleIcon,
+    stopped: StopCircleIcon,
     running: InProgressIcon,
     queued: PendingIcon,
     skipped: BanIcon,

@@ -98,9 +98,13 @@ export class Live {
         this.lastAsked = Date.now();
         clearTimeout(this.timer);
         try {
-            const { revision } = await readRevision();
+            const { revision, scheduler } = await readRevision();
             const changed = this.revision !== null && this.revision !== revision;
             this.revision = revision;
+            const { info } = this.state;
+            if (info && scheduler !== undefined) {
+                this.update({ info: { ...info, scheduler } });
+            }
             this.answered(changed);
         } catch (error) {
             this.failed(error);

@@ -1,14 +1,13 @@
-import { useEffect, useState } from 'react';
+import { useCallback, useSyncExternalStore } from 'react';
 
-/** The clock, again every `period` milliseconds while `active`. */
+/** The clock in steps of `period` milliseconds; shown anew at each while `active`. */
 export function useNow(active: boolean, period = 1000): number {
-    const [now, setNow] = useState(() => Date.now());
-    useEffect(() => {
-        if (!active) {
-            return;
-        }
-        const timer = setInterval(() => setNow(Date.now()), period);
-        return () => clearInterval(timer);
-    }, [active, period]);
-    return now;
+    const subscribe = useCallback(
+        (changed: () => void) => {
+            const timer = active ? setInterval(changed, period) : undefined;
+            return () => clearInterval(timer);
+        },
+        [active, period],
+    );
+    return useSyncExternalStore(subscribe, () => Math.floor(Date.now() / period) * period);
 }

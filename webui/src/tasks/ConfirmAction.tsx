@@ -12,8 +12,9 @@ import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
 import { useToasts } from '../ui/toasts';
-import { type Action, allows, perform } from './actions';
 import { Notice } from '../ui/Notice';
+import { type Action, allows, perform } from './actions';
+import { NoBuzzer } from './NoBuzzer';
 
 /** More names than this are counted instead of shown. */
 const MOST_NAMES = 200;
@@ -82,6 +83,7 @@ export function ConfirmAction({ action, rows, onClose }: Props) {
             />
             <ModalBody id="confirm-body">
                 {failure && <Notice variant="danger" title={failure} />}
+                {action === 'run' && able.some((row) => row.type === 'beep') && <NoBuzzer />}
                 {able.length > 0 && (
                     <Names rows={able} label={t.count(`confirm.${action}`, able.length)} />
                 )}

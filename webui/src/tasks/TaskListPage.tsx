@@ -12,6 +12,7 @@ import { Failed, Loading } from '../ui/states';
 import { ConfirmAction } from './ConfirmAction';
 import { rememberList } from './lastList';
 import { NoMatch, NoTasks } from './EmptyList';
+import { NewTask } from './NewTask';
 import { TaskTable } from './TaskTable';
 import { TaskToolbar } from './TaskToolbar';
 import { useDue } from './useDue';
@@ -74,7 +75,10 @@ export function TaskListPage({ onTitle }: ViewProps) {
     }
     return (
         <>
-            <Title headingLevel="h1">{t('list.title')}</Title>
+            <div className="orva-head">
+                <Title headingLevel="h1">{t('list.title')}</Title>
+                {list.all > 0 && <NewTask />}
+            </div>
             {list.all === 0 ? (
                 <NoTasks />
             ) : (

@@ -48,10 +48,10 @@ function NextStart({ text }: { text: string }) {
     }
     const [day, time] = format.localParts(text);
     return (
-        <>
+        <div>
             <span className="orva-nowrap">{day}</span>{' '}
             <span className="orva-nowrap">{time}</span>
-        </>
+        </div>
     );
 }
 
@@ -78,7 +78,7 @@ function RowCells(props: TaskTableProps & { row: TaskRow }) {
                 />
             </Td>
             <Td {...label('list.id')}>{row.id}</Td>
-            <Td {...label('list.name')} modifier="breakWord">
+            <Td {...label('list.name')} modifier="breakWord" className="orva-card-title">
                 {row.can_edit ? <a href={routeTo(`tasks/${row.id}`)}>{row.name}</a> : row.name}
             </Td>
             <Td {...label('list.kind')}>
@@ -105,7 +105,12 @@ export function TaskTable(props: TaskTableProps) {
     const { t } = useTexts();
     const active = COLUMNS.findIndex((column) => column.sort === view.sort);
     return (
-        <Table aria-label={t('list.title')} variant="compact" gridBreakPoint="grid-lg">
+        <Table
+            aria-label={t('list.title')}
+            variant="compact"
+            gridBreakPoint="grid-lg"
+            className="orva-cards"
+        >
             <Thead>
                 <Tr>
                     <Th screenReaderText={t('list.selectColumn')} />

@@ -12,7 +12,6 @@ import { Choice } from '../ui/Choice';
 import { Pages } from '../ui/Pages';
 import type { Action } from './actions';
 import { BulkMenu } from './BulkMenu';
-import { NewTask } from './NewTask';
 import { SelectMenu } from './SelectMenu';
 import { COLUMNS } from './TaskTable';
 import type { Selection } from './useSelection';
@@ -101,9 +100,6 @@ export function TaskToolbar(props: Props) {
                         <SortChoice view={view} onView={onView} />
                     </ToolbarItem>
                 </ToolbarGroup>
-                <ToolbarItem>
-                    <NewTask />
-                </ToolbarItem>
                 <ToolbarItem align={{ default: 'alignEnd' }} className="orva-only-wide">
                     <Pages
                         variant="top"

@@ -6,6 +6,8 @@ export interface Format {
     /** The same in two parts, for narrow places. */
     localParts(text: string): [day: string, time: string];
     localDate(text: string): string;
+    /** A date with its day of the week, in full. */
+    dateWithDay(text: string): string;
     /** An instant, shown on the appliance's clock. */
     instant(utc: string | null): string;
     /** A length of time in milliseconds. */
@@ -52,6 +54,7 @@ export function makeFormat(language: Language, zone: string | undefined): Format
         timeZone: 'UTC',
     });
     const date = new Intl.DateTimeFormat(language, { dateStyle: 'long', timeZone: 'UTC' });
+    const full = new Intl.DateTimeFormat(language, { dateStyle: 'full', timeZone: 'UTC' });
     const instant = new Intl.DateTimeFormat(language, {
         dateStyle: 'medium',
         timeStyle: 'medium',
@@ -79,11 +82,12 @@ export function makeFormat(language: Language, zone: string | undefined): Format
         local: (text) => (floating(text) ? local(day)(text) + comma + local(time)(text) : text),
         localParts: (text) => [local(day)(text), local(time)(text)],
         localDate: local(date),
+        dateWithDay: local(full),
         instant: (utc) => (utc === null ? '' : instant.format(new Date(utc))),
         length(milliseconds) {
             const seconds = Math.max(0, milliseconds) / 1000;
             if (seconds < 1) {
-                return unit(Math.round(milliseconds), 'millisecond');
+                return unit(Math.round(seconds * 1000), 'millisecond');
             }
             if (seconds < 10) {
                 return unit(seconds, 'second', 1);

@@ -42,7 +42,10 @@ export function ToastsProvider({ children }: { children: ReactNode }) {
     const add = useCallback((toast: Omit<Toast, 'id'>) => {
         next.current += 1;
         const added = { ...toast, id: next.current };
-        setToasts((old) => [added, ...old].slice(0, MOST));
+        // Failures stay until they are closed, each once; of the rest the newest says enough.
+        const stays = (old: Toast) =>
+            old.variant === 'danger' && (old.title !== toast.title || old.body !== toast.body);
+        setToasts((old) => [added, ...old.filter(stays)].slice(0, MOST));
     }, []);
     const value = useMemo<Toasts>(
         () => ({
@@ -58,27 +61,33 @@ export function ToastsProvider({ children }: { children: ReactNode }) {
 
     return (
         <Context value={value}>
-            {children}
-            <AlertGroup hasAnimations={false} isToast isLiveRegion aria-label={t('toast.region')}>
-                {toasts.map(({ id, variant, title, body }) => (
-                    <Alert
-                        key={id}
-                        variant={variant}
-                        title={title}
-                        variantLabel={t(`alert.${variant}`)}
-                        timeout={variant === 'danger' ? false : STAYS_MS}
-                        onTimeout={() => remove(id)}
-                        actionClose={
-                            <AlertActionCloseButton
-                                aria-label={t('action.close')}
-                                onClose={() => remove(id)}
-                            />
-                        }
-                    >
-                        {body}
-                    </Alert>
-                ))}
-            </AlertGroup>
+            <div className="orva-window">
+                <div className="orva-window-view">{children}</div>
+                {/* Below the view, not over it: whatever it says covers nothing. */}
+                <section className="orva-toasts" aria-label={t('toast.region')}>
+                    <AlertGroup hasAnimations={false} isLiveRegion aria-label={t('toast.region')}>
+                        {toasts.map(({ id, variant, title, body }) => (
+                            <Alert
+                                key={id}
+                                variant={variant}
+                                component="p"
+                                title={title}
+                                variantLabel={t(`alert.${variant}`)}
+                                timeout={variant === 'danger' ? false : STAYS_MS}
+                                onTimeout={() => remove(id)}
+                                actionClose={
+                                    <AlertActionCloseButton
+                                        aria-label={t('action.close')}
+                                        onClose={() => remove(id)}
+                                    />
+                                }
+                            >
+                                {body}
+                            </Alert>
+                        ))}
+                    </AlertGroup>
+                </section>
+            </div>
         </Context>
     );
 }

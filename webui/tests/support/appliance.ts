@@ -1,5 +1,13 @@
 import { type ChildProcess, execFileSync, spawn } from 'node:child_process';
-import { cpSync, mkdirSync, mkdtempSync, readFileSync, rmSync, writeFileSync } from 'node:fs';
+import {
+    appendFileSync,
+    cpSync,
+    mkdirSync,
+    mkdtempSync,
+    readFileSync,
+    rmSync,
+    writeFileSync,
+} from 'node:fs';
 import { tmpdir } from 'node:os';
 import { join } from 'node:path';
 import { createInterface } from 'node:readline';
@@ -55,6 +63,7 @@ export class Appliance {
     private server: ChildProcess | undefined;
     private scheduler: ChildProcess | undefined;
     private port = '0';
+    private tls: string[] = [];
 
     constructor() {
         cpSync(stageFolder, this.root, { recursive: true, verbatimSymlinks: true });
@@ -77,24 +86,46 @@ export class Appliance {
         execFileSync(this.program('orvaschedtool'), ['--root', this.root, '--import', file]);
     }
 
+    /** Lines for the appliance's settings, before it starts. */
+    configure(lines: string): void {
+        appendFileSync(join(this.root, 'usr/orva/etc/orva.conf'), lines);
+    }
+
+    /** Serves by TLS from the next start of the server on, with a certificate that nobody has signed. */
+    useTls(): void {
+        const [key, certificate] = ['key.pem', 'cert.pem'].map((name) => join(this.root, name));
+        const made = ['req', '-x509', '-newkey', 'ec', '-pkeyopt', 'ec_paramgen_curve:P-256', '-nodes'];
+        const subject = ['-subj', '/CN=127.0.0.1', '-addext', 'subjectAltName=IP:127.0.0.1'];
+        execFileSync(
+            'openssl',
+            [...made, ...subject, '-days', '2', '-keyout', key ?? '', '-out', certificate ?? ''],
+            { stdio: 'ignore' },
+        );
+        this.tls = ['--tls-cert', certificate ?? '', '--tls-key', key ?? ''];
+    }
+
     fillWithExample(): void {
         this.fill(join(sourceFolder, 'example/tasks.json'));
     }
 
     async start(): Promise<void> {
+        await this.startScheduler();
+        await this.startServer();
+    }
+
+    async startScheduler(): Promise<void> {
         this.scheduler = spawn(this.program('orva-schedd'), ['--root', this.root], {
             stdio: ['ignore', 'pipe', 'inherit'],
             env: ENVIRONMENT,
         });
         await lineOf(this.scheduler, /^scheduling/);
-        await this.startServer();
     }
 
     async startServer(): Promise<void> {
         const listen = `127.0.0.1:${this.port}`;
         this.server = spawn(
             this.program('orva-webapid'),
-            ['--root', this.root, '--listen', listen],
+            ['--root', this.root, '--listen', listen, ...this.tls],
             { stdio: ['ignore', 'pipe', 'ignore'], env: ENVIRONMENT },
         );
         const [, url = ''] = await lineOf(this.server, /^listening on (\S+)$/);
@@ -123,7 +154,14 @@ export class Appliance {
     link(): string {
         const output = execFileSync(
             this.program('orva-webapid'),
-            ['--root', this.root, '--listen', `127.0.0.1:${this.port}`, '--new-sign-in-link'],
+            [
+                '--root',
+                this.root,
+                '--listen',
+                `127.0.0.1:${this.port}`,
+                '--new-sign-in-link',
+                ...this.tls,
+            ],
             { encoding: 'utf8' },
         );
         const link = /http\S+#code=\S+/.exec(output)?.[0];

@@ -5,6 +5,10 @@ import { Appliance } from './appliance';
 interface Fixtures {
     /** How the appliance begins: with the example's tasks, with none, or with these. */
     tasks: 'example' | 'none' | { documents: object[] };
+    /** Whether the appliance serves by TLS. */
+    tls: boolean;
+    /** Lines for its settings. */
+    settings: string;
     appliance: Appliance;
     /** The page, signed in, showing the list. */
     app: Page;
@@ -20,9 +24,16 @@ const IGNORED = [
 export const test = base.extend<Fixtures>({
     tasks: ['example', { option: true }],
 
-    appliance: async ({ tasks }, use) => {
+    tls: [false, { option: true }],
+    settings: ['', { option: true }],
+
+    appliance: async ({ tasks, tls, settings }, use) => {
         const appliance = new Appliance();
         try {
+            appliance.configure(settings);
+            if (tls) {
+                appliance.useTls();
+            }
             if (tasks === 'example') {
                 appliance.fillWithExample();
             } else if (tasks !== 'none') {

@@ -5,6 +5,8 @@ import { expect, tab } from './test';
 interface View {
     name: string;
     open(page: Page): Promise<void>;
+    /** Takes back what would keep the page from going on to another view. */
+    close?(page: Page): Promise<void>;
 }
 
 async function show(page: Page, fragment: string): Promise<void> {
@@ -60,7 +62,7 @@ export const VIEWS: readonly View[] = [
     {
         name: 'schedule',
         open: async (page) => {
-            await editor(page, 'beep', 'Schedule');
+            await editor(page, 'script', 'Schedule');
             await page.getByLabel('Start again during the day').check();
             await expect(
                 page.getByRole('list', { name: 'Next starts' }).getByRole('listitem'),
@@ -75,9 +77,26 @@ export const VIEWS: readonly View[] = [
         open: async (page) => {
             await settings('recycle', 'All shares').open(page);
             await page.getByRole('button', { name: 'Show what would go' }).click();
-            const part = page.getByRole('button', { name: /would be removed/ });
+            const part = page.getByRole('button', { name: /would stay/ });
             await part.click();
-            await expect(page.getByRole('grid', { name: /would be removed/ })).toBeVisible();
+            await expect(page.getByRole('grid', { name: /would stay/ })).toBeVisible();
+        },
+    },
+    {
+        name: 'everything',
+        open: async (page) => {
+            await settings('recycle', 'All shares').open(page);
+            await page.getByLabel('Everything').check();
+            await expect(page.getByText('Each start empties the bins')).toBeVisible();
+        },
+        close: (page) => page.getByLabel('By age').check(),
+    },
+    {
+        name: 'other',
+        open: async (page) => {
+            await show(page, '#/tasks/6');
+            await tab(page, 'Settings');
+            await expect(page.getByText('belongs to another application')).toBeVisible();
         },
     },
     settings('service', 'Find a service'),
@@ -99,9 +118,19 @@ export const VIEWS: readonly View[] = [
         name: 'question',
         open: async (page) => {
             await show(page, '#/tasks');
-            await page.getByRole('button', { name: /^Actions for/ }).first().click();
+            await page.getByRole('button', { name: 'Actions for Lunch signal' }).click();
             await page.getByRole('menuitem', { name: 'Run now' }).click();
             await expect(page.getByRole('dialog')).toBeVisible();
         },
+    },
+    {
+        name: 'leave',
+        open: async (page) => {
+            await settings('beep', 'Duration').open(page);
+            await page.getByLabel('Duration').fill('7');
+            await page.getByRole('button', { name: 'Cancel' }).click();
+            await expect(page.getByRole('dialog')).toContainText('Leave without saving?');
+        },
+        close: (page) => page.getByRole('button', { name: 'Leave', exact: true }).click(),
     },
 ];

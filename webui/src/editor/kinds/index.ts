@@ -1,9 +1,10 @@
+import { NoBuzzer } from '../../tasks/NoBuzzer';
 import { BeepSettings } from './beep/BeepSettings';
 import { beepExtra, beepForm, beepProblems } from './beep/model';
 import { defineKind, type Kind } from './kind';
 import { asEditableKind, type EditableKind } from './names';
 import { OtherSettings } from './other/OtherSettings';
-import { recycleExtra, recycleForm, recycleProblems } from './recycle/model';
+import { newRecycleForm, recycleExtra, recycleForm, recycleProblems } from './recycle/model';
 import { RecycleSettings } from './recycle/RecycleSettings';
 import { scriptExtra, scriptForm, scriptProblems } from './script/model';
 import { ScriptSettings } from './script/ScriptSettings';
@@ -16,6 +17,7 @@ const KINDS: Record<EditableKind, Kind> = {
         toExtra: beepExtra,
         problems: beepProblems,
         Settings: BeepSettings,
+        Remark: NoBuzzer,
     }),
     script: defineKind({
         toForm: scriptForm,
@@ -25,6 +27,7 @@ const KINDS: Record<EditableKind, Kind> = {
     }),
     recycle: defineKind({
         toForm: recycleForm,
+        toNewForm: newRecycleForm,
         toExtra: recycleExtra,
         problems: recycleProblems,
         Settings: RecycleSettings,

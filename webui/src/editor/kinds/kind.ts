@@ -11,10 +11,14 @@ export interface SettingsProps<F> {
 export interface KindOf<F> {
     /** From the document's section "extra". */
     toForm(extra: unknown): F;
+    /** What a new task begins with, where the blank document is no good beginning. */
+    toNewForm?(extra: unknown): F;
     /** Back to it; for a form without problems. */
     toExtra(form: F): unknown;
     problems(form: F): Problems;
     Settings: ComponentType<SettingsProps<F>>;
+    /** Something to know about every task of the kind, whatever part of it is shown. */
+    Remark?: ComponentType;
 }
 
 /** A kind whose form only the kind itself looks into. */

@@ -1,27 +1,18 @@
-
-import { useLive } from '../../../live/live';
 import { useTexts } from '../../../texts/TextsProvider';
 import { NumberField } from '../../NumberField';
 import type { SettingsProps } from '../kind';
 import { type BeepForm, LONGEST, SHORTEST } from './model';
-import { Notice } from '../../../ui/Notice';
 
 export function BeepSettings({ form, onChange }: SettingsProps<BeepForm>) {
     const { t } = useTexts();
-    const { info } = useLive();
     return (
-        <>
-            {info?.buzzer === false && (
-                <Notice variant="info" title={t('beep.noBuzzer')} />
-            )}
-            <NumberField
-                field="extra.duration"
-                label={t('beep.duration')}
-                unit={t('beep.seconds')}
-                help={t('beep.help', { least: SHORTEST, most: LONGEST })}
-                value={form.duration}
-                onChange={(duration) => onChange({ duration })}
-            />
-        </>
+        <NumberField
+            field="extra.duration"
+            label={t('beep.duration')}
+            unit={t('beep.seconds')}
+            help={t('beep.help', { least: SHORTEST, most: LONGEST })}
+            value={form.duration}
+            onChange={(duration) => onChange({ duration })}
+        />
     );
 }

@@ -1,12 +1,13 @@
 import { FormSelect, FormSelectOption, Radio } from '@patternfly/react-core';
 
 import { useTexts } from '../../../texts/TextsProvider';
+import { Notice } from '../../../ui/Notice';
 import { Field } from '../../fields';
 import { NumberField } from '../../NumberField';
 import type { SettingsProps } from '../kind';
 import { MOST_MEGABYTES, type RecycleForm } from './model';
 
-const POLICIES = ['clean_all', 'time', 'size'] as const;
+const POLICIES = ['time', 'size', 'clean_all'] as const;
 
 /** Which files a clean removes. */
 export function PolicyField({ form, onChange }: SettingsProps<RecycleForm>) {
@@ -27,6 +28,14 @@ export function PolicyField({ form, onChange }: SettingsProps<RecycleForm>) {
                     ))
                 }
             </Field>
+            {form.policy === 'clean_all' && (
+                <Notice
+                    variant="warning"
+                    title={t(form.all ? 'recycle.emptiesAll' : 'recycle.emptiesThese')}
+                >
+                    {t('recycle.emptiesBody')}
+                </Notice>
+            )}
             {form.policy === 'time' && (
                 <NumberField
                     field="extra.days"

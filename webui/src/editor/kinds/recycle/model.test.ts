@@ -1,6 +1,6 @@
 import { describe, expect, it } from 'vitest';
 
-import { cleanRules, recycleExtra, recycleForm, recycleProblems } from './model';
+import { cleanRules, newRecycleForm, recycleExtra, recycleForm, recycleProblems } from './model';
 
 /** What the API gives for a new task. */
 const BLANK = {
@@ -46,11 +46,11 @@ const FULL_BINS = {
 };
 
 describe('the settings of a recycle-bin task', () => {
-    it('begin with everything in all bins', () => {
-        expect(recycleForm(BLANK)).toEqual({
+    it('of a new task begin with what is old, so that one click does not empty all bins', () => {
+        expect(newRecycleForm(BLANK)).toEqual({
             all: true,
             shares: [],
-            policy: 'clean_all',
+            policy: 'time',
             days: '30',
             megabytes: '100',
             order: 'oldest',
@@ -58,8 +58,18 @@ describe('the settings of a recycle-bin task', () => {
             keepSmaller: { on: false, megabytes: '100' },
             keepExtensions: false,
             extensions: '',
+            storedExtensions: [],
             switchOn: false,
         });
+        expect(recycleExtra(newRecycleForm(BLANK))).toMatchObject({
+            clean_file_policy: { policy: 'time', time: 30 },
+        });
+    });
+
+    it('of a stored task stay what they are', () => {
+        const everything = { ...BLANK, clean_share_policy: { clean_all: true, shares: [] } };
+        expect(recycleForm(everything).policy).toBe('clean_all');
+        expect(recycleExtra(recycleForm(everything))).toEqual(everything);
     });
 
     it('come back unchanged', () => {
@@ -84,6 +94,55 @@ describe('the settings of a recycle-bin task', () => {
                 },
             },
         });
+    });
+});
+
+describe('extensions that were stored by other means', () => {
+    const stored = (...words: unknown[]) =>
+        recycleForm({
+            ...OLD_BINS,
+            clean_file_policy: {
+                ...OLD_BINS.clean_file_policy,
+                reserve_policy: {
+                    extension_check: true,
+                    extension: words.map((file_ext) => ({ file_ext })),
+                },
+            },
+        });
+    const sent = (form: ReturnType<typeof recycleForm>) =>
+        (recycleExtra(form) as typeof OLD_BINS).clean_file_policy.reserve_policy.extension.map(
+            ({ file_ext }) => file_ext,
+        );
+
+    it('are neither split nor joined nor stripped while nobody changes them', () => {
+        for (const words of [['a b', 'pdf'], ['.pdf'], ['pdf', 'pdf'], ['tar.gz', 'x,y']]) {
+            expect(sent(stored(...words))).toEqual(words);
+        }
+    });
+
+    it('are refused with the one that a command line would misread', () => {
+        for (const bad of ['a b', '.pdf', 'x,y', 'a"b', '']) {
+            expect(recycleProblems(stored('doc', bad))).toEqual({
+                'extra.extensions': { key: 'problem.extension', values: { bad } },
+            });
+        }
+    });
+
+    it('are read as typed once they are changed', () => {
+        const form = { ...stored('a b', '.pdf'), extensions: 'a, b, .pdf' };
+        expect(sent(form)).toEqual(['a', 'b', 'pdf']);
+        expect(recycleProblems(form)).toEqual({});
+    });
+
+    it('may be no list of texts at all', () => {
+        const odd = (extension: unknown) =>
+            recycleForm({ clean_file_policy: { reserve_policy: { extension_check: true, extension } } });
+        for (const extension of [null, 'pdf', [null, {}, { file_ext: 7 }]]) {
+            expect(odd(extension).extensions).toBe('');
+            expect(recycleProblems(odd(extension))).toEqual({
+                'extra.extensions': { key: 'problem.noExtension' },
+            });
+        }
     });
 });
 

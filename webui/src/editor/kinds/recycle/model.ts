@@ -20,6 +20,8 @@ export interface RecycleForm {
     keepExtensions: boolean;
     /** As typed: "pdf, docx". */
     extensions: string;
+    /** Those of the document, which count while `extensions` still shows them. */
+    storedExtensions: string[];
     /** Whether saving switches the bins of the chosen shares on. */
     switchOn: boolean;
 }
@@ -40,7 +42,7 @@ interface ReserveDocument {
     size_smaller_check?: boolean;
     size_smaller?: number;
     extension_check?: boolean;
-    extension?: { file_ext: string }[];
+    extension?: unknown;
 }
 
 interface RecycleDocument {
@@ -59,6 +61,7 @@ export function recycleForm(extra: unknown): RecycleForm {
     const shares = document.clean_share_policy;
     const files = document.clean_file_policy;
     const keep = files?.reserve_policy;
+    const extensions = extensionsOf(keep?.extension);
     return {
         all: shares?.clean_all ?? true,
         shares: shares?.shares ?? [],
@@ -69,18 +72,40 @@ export function recycleForm(extra: unknown): RecycleForm {
         keepLarger: keepSize(keep?.size_greater_check, keep?.size_greater),
         keepSmaller: keepSize(keep?.size_smaller_check, keep?.size_smaller),
         keepExtensions: keep?.extension_check === true,
-        extensions: (keep?.extension ?? []).map(({ file_ext }) => file_ext).join(', '),
+        extensions: shownExtensions(extensions),
+        storedExtensions: extensions,
         switchOn: false,
     };
+}
+
+/** The blank form means everything in all bins: too much for somebody who has only looked at it. */
+export function newRecycleForm(extra: unknown): RecycleForm {
+    return { ...recycleForm(extra), policy: 'time', days: String(USUAL_DAYS) };
+}
+
+function extensionsOf(stored: unknown): string[] {
+    return (Array.isArray(stored) ? stored : [])
+        .map((each: { file_ext?: unknown } | null) => each?.file_ext)
+        .filter((text) => typeof text === 'string');
+}
+
+function shownExtensions(extensions: string[]): string {
+    return extensions.join(', ');
 }
 
 function keepSize(on: boolean | undefined, megabytes: number | undefined): KeepSize {
     return { on: on === true, megabytes: String(megabytes ?? USUAL_MEGABYTES) };
 }
 
-/** The extensions that were typed, without the dots that people put before them. */
-export function extensionList(text: string): string[] {
-    const words = text.split(/[\s,;]+/).map((word) => word.replace(/^\*?\./, ''));
+/**
+ * The extensions that are meant: the stored ones as they are, or those that were typed, without the
+ * dots that people put before them.
+ */
+export function extensionList(form: RecycleForm): string[] {
+    if (form.extensions === shownExtensions(form.storedExtensions)) {
+        return form.storedExtensions;
+    }
+    const words = form.extensions.split(/[\s,;]+/).map((word) => word.replace(/^\*?\./, ''));
     return [...new Set(words.filter(Boolean))];
 }
 
@@ -108,7 +133,7 @@ export function recycleExtra(form: RecycleForm): unknown {
                 }),
                 extension_check: form.keepExtensions,
                 ...(form.keepExtensions && {
-                    extension: extensionList(form.extensions).map((word) => ({ file_ext: word })),
+                    extension: extensionList(form).map((word) => ({ file_ext: word })),
                 }),
             },
         },
@@ -116,8 +141,8 @@ export function recycleExtra(form: RecycleForm): unknown {
     };
 }
 
-function extensionsProblem(text: string) {
-    const words = extensionList(text);
+function extensionsProblem(form: RecycleForm) {
+    const words = extensionList(form);
     if (words.length === 0) {
         return { key: 'problem.noExtension' } as const;
     }
@@ -137,7 +162,7 @@ export function recycleProblems(form: RecycleForm): Problems {
             form.policy === 'size' ? numberProblem(form.megabytes, 1, MOST_MEGABYTES) : undefined,
         'extra.keepLarger': size(form.keepLarger),
         'extra.keepSmaller': size(form.keepSmaller),
-        'extra.extensions': form.keepExtensions ? extensionsProblem(form.extensions) : undefined,
+        'extra.extensions': form.keepExtensions ? extensionsProblem(form) : undefined,
     });
 }
 
@@ -149,7 +174,7 @@ export function cleanRules(form: RecycleForm): CleanRules {
         days: form.policy === 'time' ? Number(form.days) : null,
         bytes: form.policy === 'size' ? bytes(form.megabytes) : null,
         order: form.order,
-        extensions: form.keepExtensions ? extensionList(form.extensions) : [],
+        extensions: form.keepExtensions ? extensionList(form) : [],
         keep_larger: form.keepLarger.on ? bytes(form.keepLarger.megabytes) : null,
         keep_smaller: form.keepSmaller.on ? bytes(form.keepSmaller.megabytes) : null,
     };
