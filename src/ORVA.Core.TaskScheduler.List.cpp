@@ -155,10 +155,10 @@ Json::Value MakeRow(const _tag_orva_sched_task_& task, const std::string& app,
     row[kCanDelete] = ORVASchedTaskIsCanDeleteFromUI(task);
     row[kCanEdit] = ORVASchedTaskIsCanEditFromUI(task);
     std::string action = ORVASchedTaskGetAction(task);
-    row[kAction] = strcasecmp(type.c_str(), "service") == 0 ? ReplaceServiceNames(std::move(action))
-                                                            : std::move(action);
     const std::string next = ORVASchedTaskGetNextTriggerTime(task);
     row[kNextTriggerTime] = next == "N/A" ? "-" : next;
+    row[kAction] = strcasecmp(type.c_str(), "service") == 0 ? ReplaceServiceNames(std::move(action))
+                                                            : std::move(action);
     return row;
 }
 

@@ -5,7 +5,9 @@
 #include <cstdint>
 #include <cstdlib>
 #include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -60,21 +62,33 @@ std::string BytesOfMegabytes(const Json::Value& megabytes) {
     return std::to_string(static_cast<std::uint64_t>(std::int64_t{bytes}));
 }
 
-// Elements that are no {"file_ext": text} are passed over.
-std::string JoinedExtensions(const Json::Value& extensions) {
+// The rule's extensions as the tool's one word, empty when there are none. None for a list that is
+// none, for an element that is no {"file_ext": text}, and for texts that name no extension: with
+// the check on, losing one would remove files that somebody asked to keep.
+std::optional<std::string> JoinedExtensions(const Json::Value& extensions) {
+    if (extensions.isNull()) {
+        return std::string();
+    }
+    if (!extensions.isArray()) {
+        return std::nullopt;
+    }
     std::string joined;
     const char* separator = "";
     for (const Json::Value& element : extensions) {
         const Json::Value& extension = MemberOf(element, kFileExtension);
-        if (extension.isString()) {
-            joined += separator + extension.asString();
-            separator = ".";
+        if (!extension.isString()) {
+            return std::nullopt;
         }
+        joined += separator + extension.asString();
+        separator = ".";
     }
-    return joined;
+    // The tool takes dots for separators, and refuses a word that holds nothing but these.
+    const bool named = joined.find_first_not_of(". \t") != std::string::npos;
+    return named || extensions.empty() ? std::optional(joined) : std::nullopt;
 }
 
-void AppendCleanPolicyArgs(const Json::Value& app, std::string& command) {
+// False, with `command` half written, when the extensions to keep are none.
+bool AppendCleanPolicyArgs(const Json::Value& app, std::string& command) {
     const std::string policy = TextOf(app[kPolicy]);
     if (policy == kPolicyByTime) {
         command += " -t " + TextOf(app[kDays]);
@@ -85,11 +99,15 @@ void AppendCleanPolicyArgs(const Json::Value& app, std::string& command) {
 
     const Json::Value& keepRules = app[kKeepRules];
     if (IsOn(MemberOf(keepRules, kExtensionCheck))) {
+        const std::optional<std::string> extensions =
+            JoinedExtensions(MemberOf(keepRules, kExtensions));
+        if (!extensions) {
+            return false;
+        }
         // The tool takes the extensions as one word between double quotes; they are the words of
         // the administrator who writes the task and go in as they stand.
-        const Json::Value& extensions = MemberOf(keepRules, kExtensions);
-        if (extensions.isArray() && !extensions.empty()) {
-            command += " -file_ext=\"" + JoinedExtensions(extensions) + "\"";
+        if (!extensions->empty()) {
+            command += " -file_ext=\"" + *extensions + "\"";
         }
     }
     for (const SizeRule& rule : kSizeRules) {
@@ -97,6 +115,15 @@ void AppendCleanPolicyArgs(const Json::Value& app, std::string& command) {
             command += rule.toolSwitch + BytesOfMegabytes(MemberOf(keepRules, rule.megabytes));
         }
     }
+    return true;
+}
+
+// Whether the tool would take the name for a rule, and the one after it for the rule's number. No
+// share can have such a name.
+bool ReadsAsRule(const std::string& name) {
+    constexpr std::array<std::string_view, 5> kRules = {"-t", "-s", "-o", "-m", "-l"};
+    return std::find(kRules.begin(), kRules.end(), name) != kRules.end() ||
+           name.rfind("-file_ext=", 0) == 0;
 }
 
 // False when there is no share, an element is no name, or no name could be quoted: a command
@@ -107,7 +134,7 @@ bool AppendShares(const Json::Value& shares, std::string& action, std::string& c
     }
     bool chosen = false;
     for (const Json::Value& share : shares) {
-        if (!share.isString()) {
+        if (!share.isString() || ReadsAsRule(share.asString())) {
             return false;
         }
         const std::string name = share.asString();
@@ -173,8 +200,9 @@ bool TaskSchedulerRecycleHandler::ConvertFromJson_App(const Json::Value& documen
     } else {
         action = "#share:share_clean_all_recycle_bin#";
     }
-    if (actionValue == kActionClean) {
-        AppendCleanPolicyArgs(app, command);
+    if (actionValue == kActionClean && !AppendCleanPolicyArgs(app, command)) {
+        LogSection(__LINE__, kExtensions, app);
+        return false;
     }
     ORVASchedCTaskSetAction(&task, action.c_str());
     ORVASchedCTaskSetCommand(&task, command.c_str());

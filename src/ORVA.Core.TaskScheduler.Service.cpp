@@ -72,7 +72,10 @@ class StringHash {
     StringHash& operator=(const StringHash&) = delete;
 
     explicit operator bool() const { return table != nullptr; }
-    void Set(const char* key, const char* value) { QLIBCSzHashSetValue(&table, key, value); }
+    // False when memory is short.
+    [[nodiscard]] bool Set(const char* key, const char* value) {
+        return QLIBCSzHashSetValue(&table, key, value) >= 0;
+    }
     const char* Get(const char* key) const { return QLIBCSzHashGetValue(table, key); }
 
   private:
@@ -148,20 +151,27 @@ Json::Value PackageEntry(const Package& package) {
     return NewEntry(package.id, kPackage, package.displayName);
 }
 
+bool FailForHash(int line, const char* event) {
+    syslog(LOG_ERR, "%s:%d %s", kSourceFile, line, event);
+    return false;
+}
+
 // Drops the packages that are no longer installed from the entries of `catalogue`, which stay in
-// their order, and appends those that are new. False, with nothing changed, when memory is short;
-// the line number is part of the log's contract.
+// their order, and appends those that are new. False, with a log line and `catalogue` of no use,
+// when memory is short: a package that the hash lacks would lose its entry and the user's choice.
+// The line number of the first failure is part of the log's contract.
 bool RefreshCatalogue(Json::Value& catalogue, const std::vector<Package>& installed) {
     constexpr const char* kInstalled = "i";
     constexpr const char* kPresent = "-1";
 
     StringHash states(128);
     if (!states) {
-        syslog(LOG_ERR, "%s:%d hash alloc failed", kSourceFile, 168);
-        return false;
+        return FailForHash(168, "hash alloc failed");
     }
     for (const Package& package : installed) {
-        states.Set(package.id.c_str(), kInstalled);
+        if (!states.Set(package.id.c_str(), kInstalled)) {
+            return FailForHash(__LINE__, "hash set failed");
+        }
     }
 
     if (!catalogue.isArray()) {
@@ -175,7 +185,9 @@ bool RefreshCatalogue(Json::Value& catalogue, const std::vector<Package>& instal
             if (!name.isString() || states.Get(name.asCString()) == nullptr) {
                 continue;
             }
-            states.Set(name.asCString(), kPresent);
+            if (!states.Set(name.asCString(), kPresent)) {
+                return FailForHash(__LINE__, "hash set failed");
+            }
         }
         if (&*place != &entry) {
             place->swap(entry);

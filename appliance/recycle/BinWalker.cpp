@@ -74,9 +74,13 @@ void BinWalker::ReadDirectory(Frame& frame) {
         }
         frame.foundAny = frame.foundAny || !batch.empty();
         std::sort(batch.begin(), batch.end(),
-                  [](const Entry& left, const Entry& right) { return left.inode < right.inode; });
-        for (const Entry& entry : batch) {
-            VisitEntry(frame, fd, entry);
+                  [](const DirectoryEntry& left, const DirectoryEntry& right) {
+                      return left.inode < right.inode;
+                  });
+        // What is removed is looked at right before that, and not earlier.
+        const EntryInfo* known = visitor.Removes() ? nullptr : reader.Read(fd, batch).data();
+        for (const DirectoryEntry& entry : batch) {
+            VisitEntry(frame, fd, entry, known == nullptr ? nullptr : known++);
             if (!StillInPlace(frame)) {
                 frame.moved = true;
                 frame.stays = true;
@@ -88,22 +92,26 @@ void BinWalker::ReadDirectory(Frame& frame) {
     }
 }
 
-void BinWalker::VisitEntry(Frame& frame, int fd, const Entry& entry) {
+void BinWalker::VisitEntry(Frame& frame, int fd, const DirectoryEntry& entry,
+                           const EntryInfo* known) {
     bool directory = entry.type == DT_DIR;
     if (!directory) {
-        FileInfo info;
-        const int error = ReadFileInfo(fd, entry.name, info);
-        if (error == ENOENT) {
+        EntryInfo read;
+        if (known == nullptr) {
+            read.error = ReadFileInfo(fd, entry.name, read.info);
+            known = &read;
+        }
+        if (known->error == ENOENT) {
             return;
         }
-        if (error != 0) {
-            visitor.Unreadable(frame.directory, entry.name, error);
+        if (known->error != 0) {
+            visitor.Unreadable(frame.directory, entry.name, known->error);
             frame.stays = true;
             return;
         }
-        directory = info.kind == FileKind::kDirectory;
+        directory = known->info.kind == FileKind::kDirectory;
         if (!directory) {
-            const Fate fate = visitor.File(frame.directory, fd, entry.name, info);
+            const Fate fate = visitor.File(frame.directory, fd, entry.name, known->info);
             frame.stays = frame.stays || fate != Fate::kGone;
             removedUnchecked += fate == Fate::kGone ? 1 : 0;
         }

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "appliance/recycle/DirectoryTree.h"
+#include "appliance/recycle/EntryReader.h"
 #include "appliance/recycle/FileInfo.h"
 
 namespace orva {
@@ -63,14 +64,9 @@ class BinWalker {
         bool foundAny = false;
         int passes = 0;
     };
-    struct Entry {
-        std::uint64_t inode;
-        const char* name;
-        unsigned char type;
-    };
 
     void ReadDirectory(Frame& frame);
-    void VisitEntry(Frame& frame, int fd, const Entry& entry);
+    void VisitEntry(Frame& frame, int fd, const DirectoryEntry& entry, const EntryInfo* known);
     void Enter(const char* name);
     void Leave();
     bool StillInPlace(const Frame& frame);
@@ -80,7 +76,8 @@ class BinWalker {
     BinVisitor& visitor;
     std::vector<Frame> frames;
     std::vector<char> buffer;
-    std::vector<Entry> batch;
+    std::vector<DirectoryEntry> batch;
+    EntryReader reader;
     std::size_t removedUnchecked = 0;
 };
 

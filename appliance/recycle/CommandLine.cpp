@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "appliance/recycle/ByteText.h"
+#include "appliance/util/Text.h"
 
 namespace orva {
 namespace {
@@ -36,9 +37,10 @@ What it keeps
 How
   --dry-run          remove nothing; list what would go, and why each other file stays
   --at INSTANT       with --dry-run: as if it were INSTANT (UTC, such as 2027-01-31T12:00:00Z)
-  --json             report as one JSON document
-  --root DIR         use the appliance below DIR (otherwise the environment's ORVA_ROOT, or /)
-  --                 only names of shares follow
+  --json             with --dry-run: report as one JSON document
+  --root DIR         use the appliance below DIR (otherwise the environment's ORVA_ROOT, or /);
+                     stands before the action, but for --dry-run
+  --                 only names of shares follow, at least one
   --help             show this text
 
 Exit status: 0 done, 1 something could not be done (it is named), 2 the command line is wrong
@@ -61,16 +63,6 @@ std::uint64_t MeantBytes(std::uint64_t bytes) {
     constexpr std::uint64_t kLow32Bits = std::numeric_limits<std::uint32_t>::max();
     constexpr std::uint64_t kFirstWidened = ~std::uint64_t{0} - (std::uint64_t{1} << 31) + 1;
     return bytes >= kFirstWidened ? bytes & kLow32Bits : bytes;
-}
-
-std::string_view TrimBlanks(std::string_view text) {
-    while (!text.empty() && (text.front() == ' ' || text.front() == '\t')) {
-        text.remove_prefix(1);
-    }
-    while (!text.empty() && (text.back() == ' ' || text.back() == '\t')) {
-        text.remove_suffix(1);
-    }
-    return text;
 }
 
 std::vector<std::string> ParseExtensions(std::string_view list) {
@@ -115,10 +107,15 @@ class Parser {
         while (error.empty() && !rest.empty()) {
             const std::string argument = rest.front();
             rest = rest.subspan(1);
-            if (onlyShares || argument.empty() || argument.front() != '-') {
+            if (onlyShares) {
+                noShareFollows = false;
+                dashedName = dashedName || argument.starts_with('-');
+                AddShare(argument);
+            } else if (!argument.starts_with('-')) {
                 AddShare(argument);
             } else if (argument == "--") {
                 onlyShares = true;
+                noShareFollows = true;
             } else {
                 ParseSwitch(argument);
             }
@@ -244,6 +241,7 @@ class Parser {
     }
 
     void TakeRoot(std::optional<std::string> inside) {
+        lateRoot = !actionName.empty();
         command.root = inside ? std::move(inside) : TakeValue();
         if (!command.root || command.root->empty()) {
             error = "--root needs a directory";
@@ -260,12 +258,30 @@ class Parser {
                     return;
                 }
             }
+            CheckSelection();
         } else if (given.contains("-t") && given.contains("-s")) {
             error = "-t and -s cannot be combined";
         } else if (given.contains("-o") && !given.contains("-s")) {
             error = "-o goes with -s only";
         } else if (command.at && !command.preview) {
             error = "--at goes with --dry-run only";
+        } else if (command.json && !command.preview) {
+            error = "--json goes with --dry-run only";
+        } else if (!command.preview) {
+            CheckSelection();
+        }
+    }
+
+    // Tasks hand over the names of the chosen shares as they are, after the action and before the
+    // rules. One that reads as a switch must neither turn the selection into all shares, here or
+    // below another root, nor the rules after it into names.
+    void CheckSelection() {
+        if (lateRoot) {
+            error = "--root stands before " + actionName;
+        } else if (noShareFollows) {
+            error = "-- needs the name of a share";
+        } else if (dashedName) {
+            error = "no share's name begins with a dash";
         }
     }
 
@@ -275,6 +291,9 @@ class Parser {
     std::set<std::string> given;
     std::string error;
     bool onlyShares = false;
+    bool noShareFollows = false;
+    bool dashedName = false;
+    bool lateRoot = false;
     bool help = false;
 };
 

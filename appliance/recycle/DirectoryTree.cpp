@@ -1,6 +1,7 @@
 #include "appliance/recycle/DirectoryTree.h"
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 
@@ -16,9 +17,43 @@ namespace {
 
 constexpr int kDirectoryFlags = O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK;
 
-bool IsInode(int fd, std::uint64_t device, std::uint64_t inode) {
+constexpr std::size_t kMostRecentSlots = 512;
+constexpr std::size_t kFewestRecentSlots = 64;
+
+// Apart from the descriptors used last, those of every 512th level are kept: the way back up from
+// deep below is then walked in short pieces instead of from the bin each time.
+constexpr std::size_t kMilestoneSlots = 32;
+constexpr std::uint32_t kMilestone = 512;
+
+// As many as fit into one path.
+constexpr std::uint32_t kMostLevelsUp = 1024;
+
+bool IsInode(int directory, const char* name, int flags, std::uint64_t device,
+             std::uint64_t inode) {
     struct stat status {};
-    return ::fstat(fd, &status) == 0 && status.st_dev == device && status.st_ino == inode;
+    return ::fstatat(directory, name, &status, flags | AT_NO_AUTOMOUNT) == 0 &&
+           status.st_dev == device && status.st_ino == inode;
+}
+
+// The path of the directory that many levels up, at most kMostLevelsUp.
+const char* LevelsUp(std::uint32_t levels) {
+    static const std::string path = [] {
+        std::string ups;
+        for (std::uint32_t level = 0; level < kMostLevelsUp; ++level) {
+            ups += "../";
+        }
+        return ups;
+    }();
+    return path.c_str() + path.size() - std::size_t{3} * levels;
+}
+
+// Half of what this process may have open; scattered removals want many.
+std::size_t RecentSlots() {
+    rlimit limit{};
+    if (::getrlimit(RLIMIT_NOFILE, &limit) != 0) {
+        return kFewestRecentSlots;
+    }
+    return std::clamp<rlim_t>(limit.rlim_cur / 2, kFewestRecentSlots, kMostRecentSlots);
 }
 
 }  // namespace
@@ -61,7 +96,12 @@ int OpenDirectoryAt(int parent, const char* name) {
 
 DirectoryTree::DirectoryTree(FileDescriptor parent, const std::string& binName, FileDescriptor bin,
                              FileInfo binInfo)
-    : binParent(std::move(parent)), binDirectory(std::move(bin)), device(binInfo.device) {
+    : binParent(std::move(parent)),
+      binDirectory(std::move(bin)),
+      device(binInfo.device),
+      slots(RecentSlots() + kMilestoneSlots),
+      recent{kMilestoneSlots, slots.size(), kMilestoneSlots},
+      milestones{0, kMilestoneSlots, 0} {
     names.assign(binName.c_str(), binName.c_str() + binName.size() + 1);
     nodes.push_back({binInfo.inode, 0, kBin, 0, 0, kNoSlot});
 }
@@ -97,71 +137,90 @@ void DirectoryTree::Drop(Index index) {
 }
 
 int DirectoryTree::Fd(Index index) {
-    if (index == kBin) {
-        return binDirectory.Get();
-    }
-    const std::vector<Index> chain = ChainFrom(index, true);
-    // The chain ends at the directory that is open: the bin or one in a slot.
-    Index open = chain.empty() ? index : nodes[chain.back()].parent;
-    for (std::size_t left = chain.size(); left > 0; --left) {
-        const Index next = chain[left - 1];
-        const int parent = open == kBin
-                               ? binDirectory.Get()
-                               : slots[static_cast<std::size_t>(nodes[open].slot)].fd.Get();
-        FileDescriptor fd(OpenChild(parent, next));
-        if (!fd.IsOpen()) {
-            return -1;
-        }
-        if (!IsInode(fd.Get(), device, nodes[next].inode)) {
+    if (binTrusted != trust) {
+        if (!IsBinNamed()) {
             errno = ESTALE;
             return -1;
         }
-        Keep(next, std::move(fd));
-        open = next;
+        binTrusted = trust;
     }
-    Slot& slot = slots[static_cast<std::size_t>(nodes[index].slot)];
-    slot.lastUse = ++clock;
-    return slot.fd.Get();
+    std::vector<Index> closed;
+    Index open = index;
+    while (open != kBin && !IsOpenAndTrusted(open)) {
+        closed.push_back(open);
+        open = nodes[open].parent;
+    }
+    int fd = open == kBin ? binDirectory.Get() : SlotOf(open).fd.Get();
+    for (; !closed.empty(); closed.pop_back()) {
+        const Index next = closed.back();
+        FileDescriptor opened(OpenChild(fd, next));
+        if (!opened.IsOpen()) {
+            return -1;
+        }
+        fd = opened.Get();
+        if (!IsInode(fd, "", AT_EMPTY_PATH, device, nodes[next].inode)) {
+            errno = ESTALE;
+            return -1;
+        }
+        Keep(next, std::move(opened));
+    }
+    return fd;
 }
 
-bool DirectoryTree::IsInPlace(Index index) const {
-    constexpr int kFlags = O_PATH | kDirectoryFlags;
-    FileDescriptor fd(::openat(binParent.Get(), Name(kBin), kFlags));
-    const std::vector<Index> chain = ChainFrom(index, false);
-    for (std::size_t left = chain.size(); left > 0 && fd.IsOpen(); --left) {
-        fd = FileDescriptor(::openat(fd.Get(), Name(chain[left - 1]), kFlags));
+bool DirectoryTree::IsInPlace(Index index) {
+    if (index != kBin && nodes[index].slot == kNoSlot) {
+        Distrust();
+        return Fd(index) >= 0;
     }
-    return fd.IsOpen() && IsInode(fd.Get(), device, nodes[index].inode);
+    return IsBinNamed() &&
+           (index == kBin || IsBelowBin(SlotOf(index).fd.Get(), nodes[index].depth));
 }
 
-void DirectoryTree::CloseAll() {
-    for (Slot& slot : slots) {
-        if (slot.fd.IsOpen()) {
-            Close(slot.node);
+bool DirectoryTree::IsBinNamed() const {
+    return IsInode(binParent.Get(), Name(kBin), AT_SYMLINK_NOFOLLOW, device, nodes[kBin].inode);
+}
+
+// A directory has one place only, and what is above it there is no matter of names or links: it is
+// in the bin when the bin is as many levels above it as it was.
+bool DirectoryTree::IsBelowBin(int fd, std::uint32_t depth) const {
+    FileDescriptor above;
+    for (; depth > kMostLevelsUp; depth -= kMostLevelsUp) {
+        above = FileDescriptor(::openat(fd, LevelsUp(kMostLevelsUp), O_PATH | kDirectoryFlags));
+        fd = above.Get();
+        if (!above.IsOpen()) {
+            return false;
         }
     }
+    return IsInode(fd, LevelsUp(depth), 0, device, nodes[kBin].inode);
+}
+
+bool DirectoryTree::IsOpenAndTrusted(Index index) {
+    if (nodes[index].slot == kNoSlot) {
+        return false;
+    }
+    Slot& slot = SlotOf(index);
+    if (slot.trusted != trust) {
+        if (!IsBelowBin(slot.fd.Get(), nodes[index].depth)) {
+            Close(index);
+            return false;
+        }
+        slot.trusted = trust;
+    }
+    slot.used = true;
+    return true;
 }
 
 std::string DirectoryTree::Path(Index index) const {
-    const std::vector<Index> chain = ChainFrom(index, false);
+    std::vector<Index> chain;
+    for (Index at = index; at != kBin; at = nodes[at].parent) {
+        chain.push_back(at);
+    }
     std::string path;
-    for (std::size_t left = chain.size(); left > 0; --left) {
-        path += Name(chain[left - 1]);
+    for (; !chain.empty(); chain.pop_back()) {
+        path += Name(chain.back());
         path += '/';
     }
     return path;
-}
-
-// From `index` up to, and without, the bin or with `stopAtOpen` the nearest open directory.
-std::vector<DirectoryTree::Index> DirectoryTree::ChainFrom(Index index, bool stopAtOpen) const {
-    std::vector<Index> chain;
-    for (Index at = index; at != kBin; at = nodes[at].parent) {
-        if (stopAtOpen && nodes[at].slot != kNoSlot) {
-            break;
-        }
-        chain.push_back(at);
-    }
-    return chain;
 }
 
 int DirectoryTree::OpenChild(int parent, Index index) {
@@ -174,20 +233,26 @@ int DirectoryTree::OpenChild(int parent, Index index) {
 }
 
 void DirectoryTree::Keep(Index index, FileDescriptor fd) {
-    const bool milestone = nodes[index].depth % kMilestone == 0;
-    const auto first = slots.begin() + (milestone ? kRecentSlots : 0);
-    const auto last = milestone ? slots.end() : slots.begin() + kRecentSlots;
-    // A free slot has never been used, or counts as if it had not: its time is 0.
-    const auto slot = std::min_element(first, last, [](const Slot& left, const Slot& right) {
-        return left.lastUse < right.lastUse;
-    });
-    if (slot->fd.IsOpen()) {
-        Close(slot->node);
+    Ring& ring = nodes[index].depth % kMilestone == 0 ? milestones : recent;
+    const auto advance = [&ring] {
+        const std::size_t at = ring.hand++;
+        ring.hand = ring.hand == ring.end ? ring.first : ring.hand;
+        return at;
+    };
+    std::size_t at = advance();
+    while (slots[at].used) {
+        slots[at].used = false;
+        at = advance();
     }
-    slot->fd = std::move(fd);
-    slot->node = index;
-    slot->lastUse = ++clock;
-    nodes[index].slot = static_cast<std::int16_t>(slot - slots.begin());
+    Slot& slot = slots[at];
+    if (slot.fd.IsOpen()) {
+        Close(slot.node);
+    }
+    slot.fd = std::move(fd);
+    slot.node = index;
+    slot.used = true;
+    slot.trusted = trust;
+    nodes[index].slot = static_cast<std::int16_t>(at);
 }
 
 void DirectoryTree::Close(Index index) {
@@ -195,9 +260,9 @@ void DirectoryTree::Close(Index index) {
     if (node.slot == kNoSlot) {
         return;
     }
-    Slot& slot = slots[static_cast<std::size_t>(node.slot)];
+    Slot& slot = SlotOf(index);
     slot.fd = FileDescriptor();
-    slot.lastUse = 0;
+    slot.used = false;
     node.slot = kNoSlot;
 }
 

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <array>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -13,8 +12,8 @@ namespace orva {
 // The directories of one bin that a clean is concerned with, each known by its parent, its name and
 // its inode. Gives open descriptors of them, of which only a bounded number is kept: a directory
 // whose descriptor was closed is opened again name by name from the bin, following no link, and
-// must be the same inode as before. So neither a tree of any depth nor one that is changed
-// meanwhile leads out of the bin.
+// must be the same inode as before. Whether an open one is still in the bin is told by what lies
+// above it. So neither a tree of any depth nor one that is changed meanwhile leads out of the bin.
 //
 // Threads: one at a time.
 class DirectoryTree {
@@ -37,16 +36,16 @@ class DirectoryTree {
     // Forgets `index` if it was added last; its descriptor is closed either way.
     void Drop(Index index);
 
-    // An open descriptor, valid until the next call of Add, Fd, CloseAll or Drop; it is the tree's.
-    // -1 with errno when the directory cannot be reached; ESTALE: it is not where it was.
+    // An open descriptor, valid until the next call of Add, Fd or Drop; it is the tree's. -1 with
+    // errno when the directory cannot be reached; ESTALE: it is not where it was.
     int Fd(Index index);
 
-    // Whether the directory is still found under its names. Someone may have moved it out of the
-    // bin since it was opened.
-    bool IsInPlace(Index index) const;
+    // Whether the directory is still in the bin, and the bin under its name. Someone may have moved
+    // either away since it was opened. Descriptors stay valid.
+    bool IsInPlace(Index index);
 
-    // Closes all but the bin, so that the next use of each directory finds it anew.
-    void CloseAll();
+    // Lets Fd look after the place of each directory anew, once, before it is used again.
+    void Distrust() { ++trust; }
 
     // 0 for the bin, 1 for the directories in it.
     std::uint32_t Depth(Index index) const { return nodes[index].depth; }
@@ -63,11 +62,6 @@ class DirectoryTree {
     std::uint32_t& Entries(Index index) { return nodes[index].entries; }
 
   private:
-    // The descriptors used last, and apart from them those of every 512th level: the way back up
-    // from deep below is then walked in short pieces instead of from the bin each time.
-    static constexpr std::size_t kRecentSlots = 64;
-    static constexpr std::size_t kMilestoneSlots = 32;
-    static constexpr std::uint32_t kMilestone = 512;
     static constexpr std::int16_t kNoSlot = -1;
 
     struct Node {
@@ -81,10 +75,18 @@ class DirectoryTree {
     struct Slot {
         FileDescriptor fd;
         Index node = 0;
-        std::uint64_t lastUse = 0;
+        bool used = false;  // since the hand of its ring came by
+        std::uint64_t trusted = 0;
+    };
+    // Slots of which the hand gives away the next that was not used since it came by last.
+    struct Ring {
+        std::vector<Slot>::size_type first, end, hand;
     };
 
-    std::vector<Index> ChainFrom(Index index, bool stopAtOpen) const;
+    Slot& SlotOf(Index index) { return slots[static_cast<std::size_t>(nodes[index].slot)]; }
+    bool IsBinNamed() const;
+    bool IsBelowBin(int fd, std::uint32_t depth) const;
+    bool IsOpenAndTrusted(Index index);
     int OpenChild(int parent, Index index);
     void Keep(Index index, FileDescriptor fd);
     void Close(Index index);
@@ -94,8 +96,11 @@ class DirectoryTree {
     std::uint64_t device;
     std::vector<Node> nodes;
     std::vector<char> names;
-    std::array<Slot, kRecentSlots + kMilestoneSlots> slots;
-    std::uint64_t clock = 0;
+    std::vector<Slot> slots;
+    Ring recent;
+    Ring milestones;
+    std::uint64_t trust = 0;  // counts how often trust ended
+    std::uint64_t binTrusted = 0;
 };
 
 // Opens a directory without following a link; -1 with errno.

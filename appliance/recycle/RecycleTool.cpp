@@ -135,6 +135,10 @@ int RunRecycleTool(std::span<const char* const> arguments, std::FILE* out, std::
     if (command.root) {
         SetRoot(*command.root);
     }
+    if (const std::string problem = RootProblem(); !problem.empty()) {
+        std::fprintf(err, "orvarecycle: %s\n", problem.c_str());
+        return kIncomplete;
+    }
     const std::optional<std::vector<ChosenShare>> shares = ChooseShares(command.shares);
     if (!shares) {
         std::fprintf(err, "orvarecycle: %s\n", ReasonOfLastError());

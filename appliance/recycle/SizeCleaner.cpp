@@ -19,8 +19,8 @@ __extension__ using ByteSum = unsigned __int128;
 using Index = DirectoryTree::Index;
 
 // A directory moved out of the bin must not be cleaned through a descriptor from before, so that
-// all of them are found anew after this many removals.
-constexpr unsigned kRemovalsPerReopen = 64;
+// the place of each is looked at anew after this many removals.
+constexpr unsigned kRemovalsPerCheck = 64;
 
 struct Candidate {
     std::uint64_t bytes;
@@ -135,9 +135,9 @@ class Remover {
             Foresee(candidate);
             return;
         }
-        if (++sinceReopen > kRemovalsPerReopen + tree.Depth(candidate.directory)) {
-            tree.CloseAll();
-            sinceReopen = 0;
+        if (++sinceCheck > kRemovalsPerCheck + tree.Depth(candidate.directory)) {
+            tree.Distrust();
+            sinceCheck = 0;
         }
         const char* name = names.At(candidate.name);
         FileInfo info;
@@ -194,7 +194,7 @@ class Remover {
     CleanTotals& totals;
     const NameStore& names;
     ByteSum size;
-    unsigned sinceReopen = 0;
+    unsigned sinceCheck = 0;
 };
 
 void SortCandidates(std::vector<Candidate>& candidates, const DirectoryTree& tree,

@@ -8,7 +8,10 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstddef>
+#include <filesystem>
 #include <string_view>
+#include <system_error>
+#include <thread>
 #include <utility>
 
 #include "appliance/root/Root.h"
@@ -66,6 +69,11 @@ std::string FindFault(const Json::Value& document) {
     return twice == names.end() ? std::string() : "two shares named \"" + *twice + "\"";
 }
 
+void LogFault(const std::string& path, const char* what, int error) {
+    ::syslog(LOG_ERR, "%s: %s: %s", path.c_str(), what,
+             std::generic_category().message(error).c_str());
+}
+
 // The registry's document, empty one for a missing file.
 std::optional<Json::Value> Load(const std::string& path) {
     std::string content;
@@ -76,6 +84,7 @@ std::optional<Json::Value> Load(const std::string& path) {
             empty[kShares] = Json::Value(Json::arrayValue);
             return empty;
         }
+        LogFault(path, "cannot be read", error);
         Fail(kErrSystem);
         return std::nullopt;
     }
@@ -111,20 +120,40 @@ int Store(const std::string& path, const Json::Value& document) {
     Json::StreamWriterBuilder writer;
     writer["indentation"] = "  ";
     writer["emitUTF8"] = true;
-    return WriteFileAtomically(path, Json::writeString(writer, document) + "\n");
+    if (WriteFileAtomically(path, Json::writeString(writer, document) + "\n") != 0) {
+        LogFault(path, "cannot be written", errno);
+        return -1;
+    }
+    return 0;
 }
 
-// The lock has a file of its own because the registry is replaced, and a lock on the replaced file
-// would hold nobody.
-FileDescriptor Lock(const std::string& path) {
-    FileDescriptor file(
-        ::open((path + ".lock").c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0640));
-    while (file.IsOpen() && ::flock(file.Get(), LOCK_EX) != 0) {
-        if (errno != EINTR) {
+// Locks the registry's folder: the registry itself is replaced, so a lock on it would hold nobody,
+// and a file for the lock would belong to whichever account comes first and keep the others out.
+FileDescriptor Lock(const std::string& path, std::chrono::milliseconds longestWait) {
+    constexpr std::chrono::milliseconds kRetry(2);
+    FileDescriptor folder(::open(std::filesystem::path(path).parent_path().c_str(),
+                                 O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (!folder.IsOpen()) {
+        LogFault(path, "cannot be locked", errno);
+        Fail(kErrSystem);
+        return {};
+    }
+    const auto deadline = std::chrono::steady_clock::now() + longestWait;
+    while (::flock(folder.Get(), LOCK_EX | LOCK_NB) != 0) {
+        if (errno != EWOULDBLOCK && errno != EINTR) {
+            LogFault(path, "cannot be locked", errno);
+            Fail(kErrSystem);
             return {};
         }
+        if (std::chrono::steady_clock::now() >= deadline) {
+            ::syslog(LOG_ERR, "%s: cannot be locked: another change of it takes too long",
+                     path.c_str());
+            Fail(kErrSystem);
+            return {};
+        }
+        std::this_thread::sleep_for(kRetry);
     }
-    return file;
+    return folder;
 }
 
 // The registry for a change; keeps other writers away while it lives.
@@ -134,11 +163,10 @@ struct LockedRegistry {
     Json::Value document;
 };
 
-std::optional<LockedRegistry> LoadLocked() {
+std::optional<LockedRegistry> LoadLocked(std::chrono::milliseconds longestWait) {
     std::string path = ResolvePath(kRegistryFile);
-    FileDescriptor lock = Lock(path);
+    FileDescriptor lock = Lock(path, longestWait);
     if (!lock.IsOpen()) {
-        Fail(kErrSystem);
         return std::nullopt;
     }
     std::optional<Json::Value> document = Load(path);
@@ -182,7 +210,7 @@ int ShareRegistry::Add(const Share& share) const {
     if (!IsSafeName(share.name) || !IsAppliancePath(share.path) || !IsKind(share.kind)) {
         return Fail(kErrBadArgument);
     }
-    std::optional<LockedRegistry> registry = LoadLocked();
+    std::optional<LockedRegistry> registry = LoadLocked(longestWait);
     if (!registry) {
         return -1;
     }
@@ -199,7 +227,7 @@ int ShareRegistry::Add(const Share& share) const {
 }
 
 int ShareRegistry::SetRecycle(const std::string& name, bool enabled) const {
-    std::optional<LockedRegistry> registry = LoadLocked();
+    std::optional<LockedRegistry> registry = LoadLocked(longestWait);
     if (!registry) {
         return -1;
     }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <optional>
 #include <string>
 #include <vector>
@@ -24,9 +25,13 @@ constexpr int kAllShareKinds = 0x30f;
 //
 // Errors: an empty optional or a negative result, with the reason in the last error. A damaged
 // registry (kErrBadDocument, with a line in the log) is never written over.
-// Threads: any; changes of several processes wait for one another.
+// Threads: any. Changes of several processes, whatever their accounts, take turns by a lock of the
+// registry's folder; one that cannot be had in time is kErrSystem, with a line in the log.
 class ShareRegistry {
   public:
+    explicit ShareRegistry(std::chrono::milliseconds longestWaitForOthers = std::chrono::minutes(1))
+        : longestWait(longestWaitForOthers) {}
+
     // All shares in ascending order of their names' bytes.
     [[nodiscard]] std::optional<std::vector<Share>> List() const;
 
@@ -44,6 +49,9 @@ class ShareRegistry {
     // when a link or a file stands in the folder's place, or when this process may not give the
     // folder to the share's group.
     [[nodiscard]] int SetRecycle(const std::string& name, bool enabled) const;
+
+  private:
+    std::chrono::milliseconds longestWait;
 };
 
 }  // namespace orva

@@ -7,6 +7,9 @@
 #include <filesystem>
 #include <regex>
 #include <set>
+#include <sstream>
+#include <string>
+#include <string_view>
 
 #include "tests/system/Process.h"
 
@@ -32,7 +35,54 @@ class PackagingTest : public testing::Test {
         return ReadWholeFile(root.Path() / "usr/lib/systemd/system" / name);
     }
 
+    // The system calls that a unit's filter allows: its lines count in order, each adding to what
+    // is allowed or, with a tilde, taking away from it.
+    static std::set<std::string> AllowedCalls(const std::string& unit) {
+        std::set<std::string> allowed;
+        std::istringstream lines(unit);
+        for (std::string line; std::getline(lines, line);) {
+            constexpr std::string_view kFilter = "SystemCallFilter=";
+            if (!line.starts_with(kFilter)) {
+                continue;
+            }
+            line.erase(0, kFilter.size());
+            const bool without = line.starts_with("~");
+            std::istringstream words(line.substr(without ? 1 : 0));
+            for (std::string word; words >> word;) {
+                for (const std::string& call : CallsOf(word)) {
+                    if (without) {
+                        allowed.erase(call);
+                    } else {
+                        allowed.insert(call);
+                    }
+                }
+            }
+        }
+        return allowed;
+    }
+
     Sandbox root;
+
+  private:
+    // The calls of a group of systemd's ("@chown"), or the call itself.
+    static std::set<std::string> CallsOf(const std::string& word) {
+        if (!word.starts_with("@")) {
+            return {word};
+        }
+        const ProcessResult listed =
+            RunProcess({"/usr/bin/systemd-analyze", "--no-pager", "syscall-filter", word});
+        EXPECT_EQ(listed.status, 0) << listed.err;
+        std::set<std::string> calls;
+        std::istringstream members(listed.out);
+        for (std::string member; members >> member;) {
+            if (member == "#") {
+                std::getline(members, member);  // what the group is about
+            } else if (member != word) {
+                calls.merge(CallsOf(member));
+            }
+        }
+        return calls;
+    }
 };
 
 TEST_F(PackagingTest, LiesWhereSystemdLooks) {
@@ -96,6 +146,17 @@ TEST_F(PackagingTest, TheServerRunsAsAnAccountOfItsOwnWithoutAnyRightOfRoots) {
                     // In tenths: what is exposed, of 100.
                     "--threshold=30", root.Path() / "usr/lib/systemd/system/orva-webapid.service"});
     EXPECT_EQ(rated.status, 0) << rated.out;
+}
+
+TEST_F(PackagingTest, TheServerMayGiveARecycleBinToTheSharesGroupAndStaysWithoutOtherPrivileges) {
+    const std::set<std::string> allowed = AllowedCalls(Unit("orva-webapid.service"));
+    for (const char* call : {"fchown", "fchmod", "openat", "renameat2", "flock", "accept4"}) {
+        EXPECT_TRUE(allowed.contains(call)) << call;
+    }
+    for (const char* call : {"setuid", "setresuid", "setgroups", "chroot", "mount", "ptrace", "bpf",
+                             "init_module", "clock_settime", "sched_setattr"}) {
+        EXPECT_FALSE(allowed.contains(call)) << call;
+    }
 }
 
 TEST_F(PackagingTest, TheAccountAndTheFoldersCanBeMade) {

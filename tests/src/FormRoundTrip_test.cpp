@@ -119,7 +119,7 @@ class FormRoundTrip : public ModuleTest {
             rules["extension"] = Json::Value(Json::arrayValue);
             for (int count = Below(3); count > 0; --count) {
                 Json::Value extension;
-                extension["file_ext"] = Text();
+                extension["file_ext"] = "e" + Text();
                 rules["extension"].append(extension);
             }
         }

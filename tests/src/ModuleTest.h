@@ -7,6 +7,14 @@
 #include "platform/webapi.h"
 #include "tests/fakes/PlatformTest.h"
 
+inline fakes::Task TaskWithId(int id) {
+    fakes::Task task;
+    task.id = id;
+    task.name = "task " + std::to_string(id);
+    task.app = "ORVA.ZUM.TaskScheduler.Script";
+    return task;
+}
+
 // A test that calls the module as the server does: through the method table.
 class ModuleTest : public fakes::PlatformTest {
   protected:

@@ -1,54 +1,13 @@
-#include <limits>
+#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
 
-#include "tests/src/ModuleTest.h"
+#include "tests/src/ListTest.h"
 
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kTexts = "/usr/orva/orvaman/webman/texts/enu";
-
-class ListTest : public ModuleTest {
-  protected:
-    fakes::Task& Add(int id, const std::string& app = "ORVA.ZUM.TaskScheduler.Beep") {
-        fakes::Task task;
-        task.id = id;
-        task.name = "task " + std::to_string(id);
-        task.app = app;
-        return platform.AddTask(task);
-    }
-
-    void AddTasks(int count) {
-        for (int id = 1; id <= count; ++id) {
-            Add(id);
-        }
-    }
-
-    // The document that "list" answers; a test failure when it answers an error.
-    static Json::Value List(const std::string& parameters) {
-        const std::string answer = Call("list", parameters);
-        EXPECT_EQ(answer.substr(0, 8), "success ") << answer;
-        return fakes::Document(answer.substr(8));
-    }
-
-    static std::vector<int> Ids(const Json::Value& document) {
-        std::vector<int> ids;
-        for (const Json::Value& row : document["tasks"]) {
-            ids.push_back(row["id"].asInt());
-        }
-        return ids;
-    }
-
-    // The action that the list shows for a service task with this action.
-    std::string ServiceAction(const std::string& action) {
-        Add(1, "ORVA.ZUM.TaskScheduler.Service").action = action;
-        return List("{}")["tasks"][0]["action"].asString();
-    }
-};
 
 // --- Rows ---------------------------------------------------------------------------------------
 
@@ -306,116 +265,6 @@ TEST_F(ListTest, DoesNotCheckTheReadersOfATask) {
     const Json::Value row = List("{}")["tasks"][0];
     EXPECT_EQ(row["name"], "");
     EXPECT_EQ(row["next_trigger_time"], "");
-}
-
-// --- Service names ------------------------------------------------------------------------------
-
-TEST_F(ListTest, ReplacesEveryServiceNameByItsKey) {
-    for (const auto& [name, key] : std::vector<std::pair<std::string, std::string>>{
-             {"Samba", "#network:wnds_file_service#"},
-             {"AFP", "#network:apple_subject#"},
-             {"NFS", "#nfs:nfs_title#"},
-             {"BonjourPrinter", "#network:bonjourPrinter_subject#"},
-             {"AutoBlock", "#tree:leaf_autoblock#"},
-             {"FTPES", "#tree:leaf_ftpes#"},
-             {"SFTP", "#tree:leaf_sftp#"},
-             {"FTP", "#tree:leaf_ftp#"},
-             {"WebDeck", "#tree:leaf_service#"},
-             {"SecureWebDAV", "#tree:leaf_webdav# (HTTPS)"},
-             {"WebDAV", "#tree:leaf_webdav#"},
-             {"SecureFileDeck", "#tree:leaf_filedeck# (HTTPS)"},
-             {"FileDeck", "#tree:leaf_filedeck#"},
-             {"NTP", "#time:ntp_service#"}}) {
-        EXPECT_EQ(ServiceAction("Start " + name + "."), "Start " + key + ".");
-    }
-}
-
-TEST_F(ListTest, ReplacesTheServiceNamesOfOneActionInTheOrderOfTheTable) {
-    EXPECT_EQ(ServiceAction("NTP, FileDeck, SecureFileDeck, WebDAV, SecureWebDAV, WebDeck, FTP, "
-                            "SFTP, FTPES, AutoBlock, BonjourPrinter, NFS, AFP, Samba"),
-              "#time:ntp_service#, #tree:leaf_filedeck#, #tree:leaf_filedeck# (HTTPS), "
-              "#tree:leaf_webdav#, #tree:leaf_webdav# (HTTPS), #tree:leaf_service#, "
-              "#tree:leaf_ftp#, #tree:leaf_sftp#, #tree:leaf_ftpes#, #tree:leaf_autoblock#, "
-              "#network:bonjourPrinter_subject#, #nfs:nfs_title#, #network:apple_subject#, "
-              "#network:wnds_file_service#");
-    std::vector<std::string> names;
-    for (const std::string& line : platform.Journal()) {
-        if (line.starts_with("QLIBCStrReplace")) {
-            const std::size_t start = line.find("\", \"") + 4;
-            names.push_back(line.substr(start, line.find('"', start) - start));
-        }
-    }
-    EXPECT_THAT(names, ElementsAre("Samba", "AFP", "NFS", "BonjourPrinter", "AutoBlock", "FTPES",
-                                   "SFTP", "FTP", "WebDeck", "SecureWebDAV", "WebDAV",
-                                   "SecureFileDeck", "FileDeck", "NTP"));
-}
-
-TEST_F(ListTest, GivesTheReplacementABufferOf4096Bytes) {
-    EXPECT_EQ(ServiceAction("Start FTP"), "Start #tree:leaf_ftp#");
-    EXPECT_EQ(platform.Journal()[1],
-              "QLIBCStrReplace(\"Start FTP\", \"FTP\", \"#tree:leaf_ftp#\", 0, 4096)");
-}
-
-TEST_F(ListTest, DoesNotReplaceAServiceNameInsideALongerOneThatWasReplaced) {
-    EXPECT_EQ(ServiceAction("SecureWebDAV"), "#tree:leaf_webdav# (HTTPS)");
-    EXPECT_EQ(platform.Calls("QLIBCStrReplace"), 1);
-}
-
-TEST_F(ListTest, TranslatesTheKeysOfReplacedServiceNames) {
-    platform.texts[kTexts] = fakes::Document(
-        R"({"tree": {"leaf_ftp": "FTP server"}, "common": {"start_service": "Start service"}})");
-    EXPECT_EQ(ServiceAction("#common:start_service#: FTP, Unknown"),
-              "Start service: FTP server, Unknown");
-}
-
-TEST_F(ListTest, DistinguishesUpperAndLowerCaseInServiceNames) {
-    EXPECT_EQ(ServiceAction("Start ftp and samba"), "Start ftp and samba");
-    EXPECT_EQ(platform.Calls("QLIBCStrReplace"), 0);
-}
-
-TEST_F(ListTest, LeavesServiceNamesInTasksOfOtherKindsAlone) {
-    for (const std::string app : {"ORVA.ZUM.TaskScheduler.Script", "com.example.Notes", ""}) {
-        Add(1, app).action = "Run: FTP";
-        EXPECT_EQ(List("{}")["tasks"][0]["action"], "Run: FTP") << app;
-    }
-    EXPECT_EQ(platform.Calls("QLIBCStrReplace"), 0);
-}
-
-TEST_F(ListTest, LogsAReplacementThatDoesNotFitAndKeepsTheAction) {
-    const std::string action = std::string(4080, 'x') + " FTP";
-    EXPECT_EQ(ServiceAction(action), action);
-    EXPECT_THAT(platform.Log(),
-                ElementsAre("ORVA.Core.TaskScheduler.cpp:78 replace string failed"));
-}
-
-TEST_F(ListTest, GoesOnWithTheNextNameAfterAFailedReplacement) {
-    platform.FailCall("QLIBCStrReplace");
-    EXPECT_EQ(ServiceAction("Samba and FTP"), "Samba and #tree:leaf_ftp#");
-    EXPECT_THAT(platform.Journal(),
-                ElementsAre("ORVASchedTaskListGet(null, filter)",
-                            "QLIBCStrReplace(\"Samba and FTP\", \"Samba\", "
-                            "\"#network:wnds_file_service#\", 0, 4096)",
-                            "LOG_ERR ORVA.Core.TaskScheduler.cpp:78 replace string failed",
-                            "QLIBCStrReplace(\"Samba and FTP\", \"FTP\", \"#tree:leaf_ftp#\", 0, "
-                            "4096)",
-                            "ORVASchedTaskListFree(#1)"));
-}
-
-TEST_F(ListTest, CutsALongActionAt4095BytesWhenItNamesAService) {
-    // The name lies beyond the cut, so nothing is left to replace.
-    const std::string action = std::string(4095, 'x') + "yz FTP";
-    EXPECT_EQ(ServiceAction(action), std::string(4095, 'x'));
-    EXPECT_THAT(platform.Log(), IsEmpty());
-}
-
-TEST_F(ListTest, ReplacesUpToTheLastByteOfTheBuffer) {
-    const std::string action = std::string(4080, 'x') + "FTP";
-    EXPECT_EQ(ServiceAction(action), std::string(4080, 'x') + "#tree:leaf_ftp#");
-    EXPECT_EQ(ServiceAction(action + "x"), action + "x");
-}
-
-TEST_F(ListTest, KeepsALongActionThatNamesNoService) {
-    EXPECT_EQ(ServiceAction(std::string(9000, 'x')), std::string(9000, 'x'));
 }
 
 }  // namespace

@@ -1,4 +1,3 @@
-#include <algorithm>
 #include <stdexcept>
 #include <string>
 #include <utility>
@@ -100,6 +99,27 @@ TEST_F(RecycleTask, ANameThatCannotBeQuotedLeavesAnEmptyWord) {
     EXPECT_THAT(platform.Log()[0], MatchesRegex("lib\\.cpp:21 escape cmd=a failed, errno=.*"));
 }
 
+TEST_F(RecycleTask, ANameThatThereIsNoMemoryToQuoteLeavesAnEmptyWord) {
+    platform.FailCall("calloc");
+    EXPECT_EQ(CommandOf(R"({"clean_all":"no","recycle_action":"1","selected_shares":["a","b"]})"),
+              "/usr/orva/bin/orvarecycle --enable  'b'");
+    EXPECT_EQ(Stored().action, R"(#share:share_enable_recycle_bin#: "a" "b")");
+    ASSERT_EQ(platform.Log().size(), 1U);
+    EXPECT_THAT(platform.Log()[0], MatchesRegex("lib\\.cpp:16 malloc failed, errno=.*"));
+}
+
+TEST_F(RecycleTask, WithoutMemoryToQuoteAnyNameASelectionIsRefused) {
+    platform.FailCall("calloc", 0);
+    EXPECT_EQ(SetForm(R"({"clean_share_policy":{"clean_all":false,"shares":["docs","it's"]},)"
+                      R"("enableRecycle":"select"})"),
+              R"(error 117 {"msg":"Invalid (app) object"})");
+    ASSERT_EQ(platform.Log().size(), 4U);
+    EXPECT_THAT(platform.Log()[0], MatchesRegex("lib\\.cpp:16 malloc failed, errno=.*"));
+    EXPECT_THAT(platform.Log()[2], ::testing::HasSubstr("error selected_shares, json app={"));
+    EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+    EXPECT_THAT(Enabled(), IsEmpty());
+}
+
 TEST_F(RecycleTask, SharesOfWhichNoneCanBeQuotedNeverMeanAllShares) {
     for (const char* shares : {R"([""])", R"(["",""])"}) {
         platform.ClearJournal();
@@ -108,6 +128,18 @@ TEST_F(RecycleTask, SharesOfWhichNoneCanBeQuotedNeverMeanAllShares) {
             "}";
         EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Invalid (app) object"})") << shares;
         EXPECT_EQ(platform.Calls("ORVASchedCTaskSetCommand"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+    }
+}
+
+TEST_F(RecycleTask, ARulesSwitchInThePlaceOfAShareIsRefused) {
+    for (const char* shares : {R"(["-t","30"])", R"(["docs","-s","0"])", R"(["-o","1"])",
+                               R"(["-m","1"])", R"(["-l","1"])", R"(["-file_ext=x"])"}) {
+        platform.ClearJournal();
+        Stored().appArgs =
+            std::string(R"({"clean_all":"no","recycle_action":"2","selected_shares":)") + shares +
+            "}";
+        EXPECT_EQ(SetForm("{}"), R"(error 117 {"msg":"Invalid (app) object"})") << shares;
         EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
     }
 }
@@ -258,23 +290,64 @@ TEST_F(RecycleTask, AKeepRuleCountsOnlyWhenItsCheckIsOn) {
               "/usr/orva/bin/orvarecycle --clean -m 0");
 }
 
-TEST_F(RecycleTask, ExtensionsNeedAListWithElements) {
-    const auto with = [](const std::string& extensions) {
-        return R"({"recycle_action":"2","advconfig":{"reserve_policy_extension_check":"on")" +
-               extensions + "}}";
-    };
+std::string KeepingExtensions(const std::string& extensions) {
+    return R"({"advconfig":{"reserve_policy_extension":)" + extensions +
+           R"(,"reserve_policy_extension_check":"on"},"recycle_action":"2"})";
+}
+
+TEST_F(RecycleTask, WithoutExtensionsTheCheckAddsNothing) {
+    for (const char* extensions : {"[]", "null"}) {
+        EXPECT_EQ(CommandOf(KeepingExtensions(extensions)), "/usr/orva/bin/orvarecycle --clean")
+            << extensions;
+    }
+    EXPECT_EQ(
+        CommandOf(R"({"recycle_action":"2","advconfig":{"reserve_policy_extension_check":"on"}})"),
+        "/usr/orva/bin/orvarecycle --clean");
+}
+
+TEST_F(RecycleTask, ExtensionsThatAreNoneAreLoggedAndRefusedBeforeAnyBinIsEnabled) {
     for (const char* extensions :
-         {"", R"(,"reserve_policy_extension":[])", R"(,"reserve_policy_extension":"doc")",
-          R"(,"reserve_policy_extension":{"file_ext":"doc"})"}) {
-        EXPECT_EQ(CommandOf(with(extensions)), "/usr/orva/bin/orvarecycle --clean") << extensions;
+         {R"("doc")", R"({"file_ext":"doc"})", "5", "true", R"(["doc"])",
+          R"([{"file_ext":"doc"},"pdf"])", R"([{"file_ext":"doc"},{}])", R"([{"file_ext":5}])",
+          R"([{"file_ext":null}])", R"([{"file_ext":["doc"]}])", "[null]", "[5]", R"([["doc"]])",
+          R"([{"file_ext":""}])", R"([{"file_ext":""},{"file_ext":" . "}])",
+          R"([{"file_ext":"\t."}])"}) {
+        platform.ClearJournal();
+        const std::string before = KeepingExtensions(extensions);
+        Stored().appArgs = before;
+        Stored().command = "former";
+        EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"),
+                  R"(error 117 {"msg":"Invalid (app) object"})")
+            << extensions;
+        ASSERT_EQ(platform.Log().size(), 2U);
+        EXPECT_THAT(platform.Log()[0],
+                    MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ error "
+                                 "reserve_policy_extension, json app=\\{\n\t\"advconfig\" : .*"));
+        EXPECT_EQ(platform.Log()[1],
+                  "ORVA.Core.TaskScheduler.Basic.cpp:244 Convert task from json (app) failed. "
+                  "[0x0000 :0]");
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAppArgs"), 1);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetAction"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedCTaskSetCommand"), 0);
+        EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
+        EXPECT_THAT(Enabled(), IsEmpty());
+        EXPECT_EQ(Stored().appArgs, before);
+        EXPECT_EQ(Stored().command, "former");
     }
 }
 
-TEST_F(RecycleTask, ExtensionsThatAreNoTextArePassedOver) {
-    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","advconfig":{)"
-                        R"("reserve_policy_extension_check":"on","reserve_policy_extension":)"
-                        R"(["x",5,null,[1],{"file_ext":"a"},{"file_ext":{}},{},{"file_ext":""},)"
-                        R"({"file_ext":"b"}]}})"),
+TEST_F(RecycleTask, ExtensionsThatAreNoneAreNotLookedAtWhereNothingIsKept) {
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"1","advconfig":{"reserve_policy_extension":["doc"],)"
+                        R"("reserve_policy_extension_check":"on"}})"),
+              "/usr/orva/bin/orvarecycle --enable");
+    EXPECT_EQ(CommandOf(R"({"recycle_action":"2","advconfig":{"reserve_policy_extension":["doc"],)"
+                        R"("reserve_policy_extension_check":"off"}})"),
+              "/usr/orva/bin/orvarecycle --clean");
+}
+
+TEST_F(RecycleTask, AnEmptyTextBetweenExtensionsLeavesTheOthers) {
+    EXPECT_EQ(CommandOf(KeepingExtensions(
+                  R"([{"file_ext":"a"},{"file_ext":""},{"file_ext":"b","more":1}])")),
               "/usr/orva/bin/orvarecycle --clean -file_ext=\"a..b\"");
 }
 
@@ -304,107 +377,7 @@ TEST_F(RecycleTask, OtherPoliciesAddNoSwitch) {
     }
 }
 
-// --- Enabling recycle bins -----------------------------------------------------------------------
-
-TEST_F(RecycleTask, SelectWithoutSharesEnablesNothingAndSucceeds) {
-    EXPECT_EQ(SetForm(R"({"enableRecycle":"select","clean_share_policy":{"shares":["docs"]}})"),
-              R"(success {"id":5})");
-    EXPECT_THAT(Enabled(), IsEmpty());
-    EXPECT_EQ(platform.Calls("ORVAShareEnum"), 0);
-}
-
-TEST_F(RecycleTask, AnyOtherWishEnablesEveryShareInListOrder) {
-    for (const char* wish : {R"("all")", R"("")", R"("Select")", "true", "1"}) {
-        platform.ClearJournal();
-        EXPECT_EQ(SetForm(std::string(R"({"enableRecycle":)") + wish + "}"), R"(success {"id":5})");
-        EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
-                                           R"(ORVARecycleStatusSet("home", 1))",
-                                           R"(ORVARecycleStatusSet("it's", 1))"))
-            << wish;
-    }
-}
-
-TEST_F(RecycleTask, AllIncludeHomeEnablesEveryShareAndThenHome) {
-    platform.shares = {"docs", "video"};
-    SetForm(R"({"enableRecycle":"all_include_home"})");
-    const std::vector<std::string> journal = platform.Journal();
-    const auto from = std::find(journal.begin(), journal.end(), "QLIBCSzListAlloc(100)");
-    EXPECT_THAT(
-        std::vector<std::string>(from, journal.end()),
-        ElementsAre("QLIBCSzListAlloc(100)", "ORVAShareEnum(#1, 783)",
-                    R"(ORVARecycleStatusSet("docs", 1))", R"(ORVARecycleStatusSet("video", 1))",
-                    R"(ORVARecycleStatusSet("home", 1))",
-                    MatchesRegex("LOG_ERR ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ "
-                                 "enable share=home recycle bin failed"),
-                    "QLIBCSzListFree(#1)", "ORVASchedTaskSave(#2)", "ORVASchedTaskFree(#2)"));
-}
-
-TEST_F(RecycleTask, WithoutAnyShareOnlyHomeIsEnabled) {
-    platform.shares.clear();
-    SetForm(R"({"enableRecycle":"all_include_home"})");
-    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("home", 1))"));
-}
-
-TEST_F(RecycleTask, AShareThatCannotBeEnabledIsLoggedAndTheNextOnesFollow) {
-    platform.FailCall("ORVARecycleStatusSet", 2);
-    EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"), R"(success {"id":5})");
-    EXPECT_EQ(Enabled().size(), 3U);
-    ASSERT_EQ(platform.Log().size(), 1U);
-    EXPECT_THAT(platform.Log()[0],
-                MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ enable share=home "
-                             "recycle bin failed"));
-}
-
-TEST_F(RecycleTask, WithoutMemoryForTheSharesTheTaskIsSavedAllTheSame) {
-    platform.FailCall("QLIBCSzListAlloc");
-    EXPECT_EQ(SetForm(R"({"enableRecycle":"all"})"), R"(success {"id":5})");
-    ASSERT_EQ(platform.Log().size(), 1U);
-    EXPECT_THAT(platform.Log()[0],
-                MatchesRegex("ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ malloc failed"));
-    EXPECT_THAT(Enabled(), IsEmpty());
-}
-
-TEST_F(RecycleTask, WithoutTheListOfSharesTheTaskIsSavedAllTheSame) {
-    platform.FailCall("ORVAShareEnum");
-    EXPECT_EQ(SetForm(R"({"enableRecycle":"all_include_home"})"), R"(success {"id":5})");
-    const std::vector<std::string> journal = platform.Journal();
-    const auto from = std::find(journal.begin(), journal.end(), "QLIBCSzListAlloc(100)");
-    EXPECT_THAT(
-        std::vector<std::string>(from, journal.end()),
-        ElementsAre("QLIBCSzListAlloc(100)", "ORVAShareEnum(#1, 783)",
-                    MatchesRegex("LOG_ERR ORVA\\.Core\\.TaskScheduler\\.Recycle\\.cpp:[0-9]+ enum "
-                                 "share failed"),
-                    "QLIBCSzListFree(#1)", "ORVASchedTaskSave(#2)", "ORVASchedTaskFree(#2)"));
-}
-
-TEST_F(RecycleTask, ANameMissingFromTheListIsPassedOver) {
-    platform.FailCall("QLIBCSzListGet", 2);
-    SetForm(R"({"enableRecycle":"all"})");
-    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
-                                       R"(ORVARecycleStatusSet("it's", 1))"));
-}
-
-TEST_F(RecycleTask, EnablingReportsWhetherTheListOfSharesCouldBeHad) {
-    ORVA::APIRequest request = Request("{}");
-    ORVA::APIResponse response;
-    TaskSchedulerRecycleHandler handler(&request, &response);
-    EXPECT_TRUE(handler.EnableRecycleBin(Document(R"(["docs",5,"none"])"), "select"));
-    EXPECT_THAT(Enabled(), ElementsAre(R"(ORVARecycleStatusSet("docs", 1))",
-                                       R"(ORVARecycleStatusSet("none", 1))"));
-    EXPECT_TRUE(handler.EnableRecycleBin(Json::Value(), "all"));
-    platform.FailCall("QLIBCSzListAlloc");
-    EXPECT_FALSE(handler.EnableRecycleBin(Json::Value(), "all"));
-    platform.FailCall("ORVAShareEnum");
-    EXPECT_FALSE(handler.EnableRecycleBin(Json::Value(), "all"));
-}
-
-TEST_F(RecycleTask, AWishThatIsNoTextEndsAsAnExceptionWithNothingEnabledOrSaved) {
-    for (const char* wish : {"{}", "[\"select\"]"}) {
-        EXPECT_THROW(SetForm(std::string(R"({"enableRecycle":)") + wish + "}"), Json::LogicError);
-    }
-    EXPECT_THAT(Enabled(), IsEmpty());
-    EXPECT_EQ(platform.Calls("ORVASchedTaskSave"), 0);
-}
+// --- Failures ------------------------------------------------------------------------------------
 
 TEST_F(RecycleTask, AFailedSaveLeavesTheBinsEnabled) {
     platform.FailCall("ORVASchedTaskSave");

@@ -43,10 +43,10 @@ TEST(CommandLineTest, UnderstandsTheCommandLineOfATask) {
 }
 
 TEST(CommandLineTest, TakesSharesAfterTheSwitches) {
-    const RecycleCommand command = Good({"-s", "5", "--clean", "-o", "2", "a b", "--", "-t"});
+    const RecycleCommand command = Good({"-s", "5", "--clean", "-o", "2", "a b", "--", "t"});
     EXPECT_EQ(command.rules.sizeLimit, 5U);
     EXPECT_EQ(command.rules.order, SizeOrder::kLargestFirst);
-    EXPECT_THAT(command.shares, ElementsAre("a b", "-t"));
+    EXPECT_THAT(command.shares, ElementsAre("a b", "t"));
 }
 
 TEST(CommandLineTest, TakesAnEmptyNameForANameAndNotForAllShares) {
@@ -116,6 +116,87 @@ TEST(CommandLineTest, RefusesSwitchesThatDoNotFitTogether) {
     EXPECT_EQ(ErrorOf({"--enable", "--dry-run"}), "--dry-run goes with --clean only");
     EXPECT_EQ(ErrorOf({"--clean", "--at", "2027-01-31T12:00:00Z"}),
               "--at goes with --dry-run only");
+    EXPECT_EQ(ErrorOf({"--clean", "--json"}), "--json goes with --dry-run only");
+}
+
+TEST(CommandLineTest, TakesTheRootAfterTheActionForAPreviewOnly) {
+    EXPECT_EQ(Good({"--clean", "--root", "/srv/x", "--dry-run"}).root, "/srv/x");
+    EXPECT_EQ(ErrorOf({"--clean", "--root", "/srv/x"}), "--root stands before --clean");
+    EXPECT_EQ(ErrorOf({"--disable", "--root=/srv/x"}), "--root stands before --disable");
+}
+
+TEST(CommandLineTest, NeedsTheNameOfAShareAfterTheLastSwitchUnlessItOnlyLooks) {
+    EXPECT_EQ(ErrorOf({"--enable", "--"}), "-- needs the name of a share");
+    EXPECT_EQ(ErrorOf({"--clean", "photo", "--"}), "-- needs the name of a share");
+    EXPECT_EQ(ErrorOf({"--clean", "--", "photo", "-t", "30"}),
+              "no share's name begins with a dash");
+    EXPECT_THAT(Good({"--clean", "--dry-run", "--"}).shares, IsEmpty());
+    EXPECT_THAT(Good({"--clean", "--dry-run", "--", "-t"}).shares, ElementsAre("-t"));
+}
+
+// What follows the names in the command lines of tasks.
+const std::vector<std::vector<const char*>> kRulesOfTasks = {
+    {},
+    {"-t", "30"},
+    {"-s", "1048576", "-o", "1"},
+    {"-file_ext=doc.pdf"},
+    {"-t", "30", "-file_ext=doc.pdf", "-m", "1048576", "-l", "0"},
+};
+
+// Whether a change by this command line is one of nothing but the named shares, by all of `rules`.
+bool StaysWithin(const std::vector<const char*>& arguments, const RecycleCommand& rules) {
+    const ParsedCommandLine parsed = ParseCommandLine(arguments);
+    if (!parsed.command || parsed.command->action == RecycleAction::kHelp ||
+        parsed.command->preview) {
+        return true;
+    }
+    const RecycleCommand& command = *parsed.command;
+    return !command.shares.empty() && !command.root && command.rules.days == rules.rules.days &&
+           command.rules.sizeLimit == rules.rules.sizeLimit &&
+           command.rules.keepExtensions == rules.rules.keepExtensions &&
+           command.rules.keepLarger == rules.rules.keepLarger &&
+           command.rules.keepSmaller == rules.rules.keepSmaller;
+}
+
+TEST(CommandLineTest, ANameThatReadsAsASwitchNeverWidensATasksSelectionOrLosesItsRules) {
+    for (const char* action : {"--enable", "--disable", "--clean"}) {
+        for (const std::vector<const char*>& rules : kRulesOfTasks) {
+            if (action != std::string("--clean") && !rules.empty()) {
+                continue;
+            }
+            std::vector<const char*> all = {action};
+            all.insert(all.end(), rules.begin(), rules.end());
+            const RecycleCommand meant = Good(all);
+            for (const char* name :
+                 {"--",          "--json", "--dry-run", "--at",      "--root",    "--root=",
+                  "--root=/",    "--help", "--enable",  "--disable", "--clean",   "-t",
+                  "-s",          "-o",     "-m",        "-l",        "-file_ext", "-file_ext=",
+                  "-file_ext=.", "-",      "-x",        "--unknown", ""}) {
+                for (const std::vector<const char*>& names : {std::vector<const char*>{name},
+                                                              {name, "photo"},
+                                                              {"photo", name},
+                                                              {name, name}}) {
+                    std::vector<const char*> arguments = {action};
+                    arguments.insert(arguments.end(), names.begin(), names.end());
+                    arguments.insert(arguments.end(), rules.begin(), rules.end());
+                    EXPECT_TRUE(StaysWithin(arguments, meant)) << testing::PrintToString(arguments);
+                }
+            }
+        }
+    }
+}
+
+TEST(CommandLineTest, ANameThatReadsAsAWholeRuleNeverWidensASelectionThatHoldsAShare) {
+    for (const std::vector<const char*>& rule : {std::vector<const char*>{"-t", "30"},
+                                                 {"-s", "0"},
+                                                 {"-m", "1"},
+                                                 {"-l", "1"},
+                                                 {"-file_ext=doc"},
+                                                 {"-s", "0", "-o", "2"}}) {
+        std::vector<const char*> arguments = {"--clean", "photo"};
+        arguments.insert(arguments.end(), rule.begin(), rule.end());
+        EXPECT_THAT(Good(arguments).shares, ElementsAre("photo"));
+    }
 }
 
 TEST(CommandLineTest, RefusesWhatItDoesNotKnow) {
@@ -135,8 +216,8 @@ TEST(CommandLineTest, ReadsTheInstantOfAPreview) {
 }
 
 TEST(CommandLineTest, TakesTheRootInBothForms) {
-    EXPECT_EQ(Good({"--clean", "--root", "/srv/x"}).root, "/srv/x");
-    EXPECT_EQ(Good({"--enable", "--root=/srv/x"}).root, "/srv/x");
+    EXPECT_EQ(Good({"--root", "/srv/x", "--clean"}).root, "/srv/x");
+    EXPECT_EQ(Good({"--root=/srv/x", "--enable"}).root, "/srv/x");
     EXPECT_EQ(ErrorOf({"--clean", "--root"}), "--root needs a directory");
     EXPECT_EQ(ErrorOf({"--clean", "--root="}), "--root needs a directory");
     EXPECT_EQ(ErrorOf({"--clean", "--root=/a", "--root", "/b"}), "--root is given twice");

@@ -156,19 +156,37 @@ TEST_F(RecycleToolTest, PreviewsALaterDay) {
 TEST_F(RecycleToolTest, UsesTheRootThatItIsGiven) {
     const std::string other = RootPath() + "/other";
     MakeDirectory("/other");
-    EXPECT_EQ(Run({"--clean", "photo", "--root", other.c_str()}), 1);
+    EXPECT_EQ(Run({"--root", other.c_str(), "--clean", "photo"}), 1);
     EXPECT_EQ(err, "orvarecycle: photo: there is no such share\n");
 }
 
-TEST_F(RecycleToolTest, ReportsACleanAsOneDocument) {
-    Write("/volume1/photo/.recycle/file", "xyz");
-    EXPECT_EQ(Run({"--clean", "--json"}), 0);
+TEST_F(RecycleToolTest, ARootThatIsNotThereIsAMistake) {
+    const std::string mistyped = RootPath() + "/mistyped";
+    EXPECT_EQ(Run({"--root", mistyped.c_str(), "--clean"}), 1);
+    EXPECT_EQ(err, "orvarecycle: the root " + mistyped + ": No such file or directory\n");
+    EXPECT_FALSE(Exists("/mistyped"));
+}
+
+TEST_F(RecycleToolTest, ReportsAPreviewAsOneDocument) {
+    MakeDirectory("/volume1/photo/.recycle/folder");
+    EXPECT_EQ(Run({"--clean", "--dry-run", "--json"}), 0);
     EXPECT_EQ(out,
-              "{\"dry_run\":false,\"at\":\"2027-01-15T08:00:00Z\",\"bins\":[\n"
-              "{\"share\":\"photo\",\n\"keep\":[],\n\"failures\":[],\n"
-              "\"totals\":{\"removed_files\":1,\"removed_bytes\":3,\"removed_folders\":0,"
+              "{\"dry_run\":true,\"at\":\"2027-01-15T08:00:00Z\",\"bins\":[\n"
+              "{\"share\":\"photo\",\"remove\":[\n"
+              "{\"path\":\"folder/\",\"kind\":\"folder\",\"bytes\":0}],\n"
+              "\"keep\":[],\n\"failures\":[],\n"
+              "\"totals\":{\"removed_files\":0,\"removed_bytes\":0,\"removed_folders\":1,"
               "\"kept_files\":0,\"kept_bytes\":0,\"failures\":0,\"over_limit_bytes\":0}}],\n"
               "\"notes\":[],\n\"problems\":[]}\n");
+}
+
+TEST_F(RecycleToolTest, TouchesNothingForASwitchInThePlaceOfAShare) {
+    Write("/volume1/photo/.recycle/file", "xyz");
+    for (const char* name : {"--", "--json", "--root=/", "-t", "-file_ext=", "--at", "--enable"}) {
+        EXPECT_EQ(Run({"--clean", name}), 2) << name;
+        EXPECT_EQ(Run({"--clean", "photo", name}), 2) << name;
+    }
+    EXPECT_TRUE(Exists("/volume1/photo/.recycle/file"));
 }
 
 TEST_F(RecycleToolTest, Helps) {

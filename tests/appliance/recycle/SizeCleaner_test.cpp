@@ -4,6 +4,12 @@
 #include <gmock/gmock.h>
 #include <unistd.h>
 
+#include <atomic>
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <thread>
+
 #include "tests/appliance/recycle/BinTest.h"
 
 namespace orva {
@@ -130,6 +136,57 @@ TEST_F(SizeCleanerTest, PreviewsWhatItThenDoes) {
     EXPECT_EQ(foreseen.removedBytes, totals.removedBytes);
     EXPECT_EQ(foreseen.removedDirectories, totals.removedDirectories);
     EXPECT_EQ(foreseen.keptBytes, totals.keptBytes);
+}
+
+TEST_F(SizeCleanerTest, StopsInAFolderThatWasMovedOutOfTheBin) {
+    constexpr std::ptrdiff_t kFiles = 1000;
+    const std::string restored = SharePath() + "/restored";
+    const auto count = [](const std::string& folder) {
+        std::error_code gone;
+        return std::distance(std::filesystem::directory_iterator(folder, gone), {});
+    };
+    // The clean may be done before the folder is moved; then it is tried again.
+    for (bool moved = false; !moved;) {
+        Directory("album/day");
+        for (std::ptrdiff_t at = 0; at < kFiles; ++at) {
+            std::ofstream(InBin("album/day/file") + std::to_string(at)) << "x";
+        }
+        std::ptrdiff_t leftThen = 0;
+        std::atomic<bool> done = false;
+        std::thread user([&] {
+            while (!done && std::filesystem::exists(InBin("album/day/file0"))) {
+            }
+            moved = ::rename(InBin("album").c_str(), restored.c_str()) == 0;
+            leftThen = moved ? count(restored + "/day") : 0;
+        });
+        Clean(Limit(0));
+        done = true;
+        user.join();
+        if (moved) {
+            EXPECT_GE(count(restored + "/day"), leftThen - 70);
+            moved = leftThen > 70;
+            std::filesystem::remove_all(restored);
+        }
+    }
+    EXPECT_THAT(report->failed, IsEmpty());
+    EXPECT_THAT(Contents(), IsEmpty());
+}
+
+TEST_F(SizeCleanerTest, GoesThroughManyFoldersInTheOrderOfSize) {
+    // More folders than are kept open, and every next file lies in another one.
+    constexpr std::size_t kFolders = 700;
+    constexpr std::size_t kPerFolder = 3;
+    for (std::size_t size = 0; size < kFolders * kPerFolder; ++size) {
+        const std::string folder = "album" + std::to_string(size % kFolders);
+        Directory(folder);
+        std::ofstream(InBin(folder) + "/file" + std::to_string(size)) << std::string(size + 1, 'x');
+    }
+    // The two smallest files hold 3 bytes together.
+    const CleanTotals totals = Clean(Limit(3, SizeOrder::kLargestFirst));
+    EXPECT_EQ(totals.failures, 0U);
+    EXPECT_EQ(totals.removedFiles, 2098U);
+    EXPECT_EQ(totals.removedDirectories, 698U);
+    EXPECT_THAT(Contents(), ElementsAre("album0/", "album0/file0", "album1/", "album1/file1"));
 }
 
 }  // namespace

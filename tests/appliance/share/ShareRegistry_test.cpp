@@ -1,15 +1,28 @@
 #include "appliance/share/ShareRegistry.h"
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <grp.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <filesystem>
+#include <string>
 #include <thread>
+
+#include "appliance/util/FileDescriptor.h"
 
 #include "platform/qlibc.h"
 #include "tests/appliance/util/Sandbox.h"
 
 namespace {
+
+// An account that owns nothing else here.
+constexpr uid_t kServer = 54321;
+constexpr gid_t kServersGroup = 54322;
 
 using orva::Share;
 using orva::ShareRegistry;
@@ -33,6 +46,54 @@ class ShareRegistryTest : public Sandbox {
             names.push_back(share.name);
         }
         return names;
+    }
+
+    // Gives the registry's folder and the share to the server's account where the tests may, that
+    // is, as root.
+    void GiveToServer() const {
+        for (const char* place : {"/usr/orva/etc", "/volume1/photo"}) {
+            if (::geteuid() == 0) {
+                EXPECT_EQ(::chown((RootPath() + place).c_str(), kServer, kServersGroup), 0);
+            }
+            EXPECT_EQ(::chmod((RootPath() + place).c_str(), 0750), 0);
+        }
+        EXPECT_EQ(::chmod(RootPath().c_str(), 0711), 0);
+    }
+
+    // Switches the bin of "photo" on by the server's account; what it logged, or "on".
+    static std::string EnableAsServer() {
+        int ends[2] = {};
+        EXPECT_EQ(::pipe(ends), 0);
+        const pid_t child = ::fork();
+        if (child == 0) {
+            if (::geteuid() == 0 &&
+                (::setgroups(0, nullptr) != 0 ||
+                 ::setresgid(kServersGroup, kServersGroup, kServersGroup) != 0 ||
+                 ::setresuid(kServer, kServer, kServer) != 0)) {
+                ::_exit(1);
+            }
+            std::string outcome = ShareRegistry().SetRecycle("photo", true) == 0 ? "on" : "failed";
+            for (const std::string& line : TakeLog()) {
+                outcome += "\n" + line;
+            }
+            ::_exit(::write(ends[1], outcome.data(), outcome.size()) > 0 ? 0 : 1);
+        }
+        ::close(ends[1]);
+        std::string outcome;
+        char block[4096];
+        for (ssize_t got = 0; (got = ::read(ends[0], block, sizeof block)) > 0;) {
+            outcome.append(block, static_cast<std::size_t>(got));
+        }
+        ::close(ends[0]);
+        int status = -1;
+        EXPECT_EQ(::waitpid(child, &status, 0), child);
+        EXPECT_EQ(status, 0);
+        return outcome;
+    }
+
+    orva::FileDescriptor OpenFolder() const {
+        return orva::FileDescriptor(
+            ::open((RootPath() + "/usr/orva/etc").c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     }
 
     const ShareRegistry registry{};
@@ -186,6 +247,8 @@ TEST_F(ShareRegistryTest, FailsWhereItsDirectoryIsMissing) {
     std::filesystem::remove_all(RootPath() + "/usr");
     EXPECT_LT(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
     EXPECT_EQ(QLIBCErrGet(), 0x0500);
+    EXPECT_THAT(TakeLog(),
+                ElementsAre(RootPath() + kFile + ": cannot be locked: No such file or directory"));
 }
 
 TEST_F(ShareRegistryTest, FailsWhereItsFileCannotBeRead) {
@@ -193,6 +256,69 @@ TEST_F(ShareRegistryTest, FailsWhereItsFileCannotBeRead) {
     EXPECT_FALSE(registry.List().has_value());
     EXPECT_EQ(QLIBCErrGet(), 0x0500);
     EXPECT_LT(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+    const std::string line = RootPath() + kFile + ": cannot be read: Invalid argument";
+    EXPECT_THAT(TakeLog(), ElementsAre(line, line));
+}
+
+TEST_F(ShareRegistryTest, SaysWhyItCannotBeWritten) {
+    MakeDirectory(std::string(kFile) + ".new");
+    EXPECT_LT(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+    EXPECT_EQ(QLIBCErrGet(), 0x0500);
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile + ": cannot be written: File exists"));
+}
+
+TEST_F(ShareRegistryTest, IsChangedByTheServersAccountAfterRootWasThereFirst) {
+    ASSERT_EQ(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+    GiveToServer();
+    ASSERT_EQ(registry.SetRecycle("photo", false), 0);
+    EXPECT_EQ(EnableAsServer(), "on");
+    EXPECT_TRUE(registry.Find("photo")->recycleBin);
+    ASSERT_EQ(registry.SetRecycle("photo", false), 0);
+    EXPECT_EQ(EnableAsServer(), "on");
+}
+
+TEST_F(ShareRegistryTest, TakesNoNoticeOfALockFileThatAnotherAccountOwns) {
+    ASSERT_EQ(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+    const std::string left = std::string(kFile) + ".lock";
+    Write(left, "");
+    ASSERT_EQ(::chmod((RootPath() + left).c_str(), 0), 0);
+    GiveToServer();
+    EXPECT_EQ(EnableAsServer(), "on");
+    EXPECT_TRUE(std::filesystem::exists(RootPath() + left));
+}
+
+TEST_F(ShareRegistryTest, LeavesNoFileBesideTheRegistry) {
+    ASSERT_EQ(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+    std::vector<std::string> names;
+    for (const auto& entry : std::filesystem::directory_iterator(RootPath() + "/usr/orva/etc")) {
+        names.push_back(entry.path().filename());
+    }
+    EXPECT_THAT(names, ElementsAre("shares.json"));
+}
+
+TEST_F(ShareRegistryTest, WaitsForTheChangeOfAnotherProcess) {
+    orva::FileDescriptor other = OpenFolder();
+    ASSERT_EQ(::flock(other.Get(), LOCK_EX), 0);
+    std::atomic<bool> done = false;
+    std::thread writer([&] {
+        EXPECT_EQ(registry.Add({"photo", "/volume1/photo", 1, false}), 0);
+        done = true;
+    });
+    EXPECT_THAT(Names(), IsEmpty());  // a reader does not wait
+    EXPECT_FALSE(done);
+    other = orva::FileDescriptor();
+    writer.join();
+    EXPECT_THAT(Names(), ElementsAre("photo"));
+}
+
+TEST_F(ShareRegistryTest, GivesUpWhenAnotherProcessKeepsTheLock) {
+    const orva::FileDescriptor other = OpenFolder();
+    ASSERT_EQ(::flock(other.Get(), LOCK_EX), 0);
+    EXPECT_LT(ShareRegistry(std::chrono::milliseconds(0)).Add({"a", "/volume1/a", 1, false}), 0);
+    EXPECT_EQ(QLIBCErrGet(), 0x0500);
+    EXPECT_THAT(TakeLog(), ElementsAre(RootPath() + kFile +
+                                       ": cannot be locked: another change of it takes too long"));
+    EXPECT_FALSE(std::filesystem::exists(RootPath() + kFile));
 }
 
 TEST_F(ShareRegistryTest, LosesNoChangeOfManyThreadsAndShowsReadersWholeVersions) {
