@@ -46,7 +46,8 @@ struct Run {
     std::optional<absl::Time> occurrence;
     RunReason reason = RunReason::kByHand;
     RunState state = RunState::kQueued;
-    // A skipped run: why. An ended one without an exit status or signal: why it could not start.
+    // A skipped or lost run: why. An ended one without an exit status or signal: why it could not
+    // start; one with either: "stopped" when somebody has stopped it.
     std::string why;
     // When it was recorded. Instants are kept in whole milliseconds.
     absl::Time queuedAt;

@@ -1,9 +1,16 @@
 #include "appliance/runs/RunStore.h"
 
+#include <syslog.h>
+
+#include <mutex>
+#include <set>
+#include <string>
 #include <utility>
 
 #include "appliance/runs/RunTable.h"
+#include "appliance/runs/RunWriter.h"
 #include "appliance/store/DatabaseGuard.h"
+#include "appliance/store/StoreFailure.h"
 #include "appliance/supervisor/RunFolder.h"
 
 namespace orva {
@@ -17,6 +24,31 @@ auto Reading(Database& database, Operation operation) {
         const ReadTransaction transaction(*lease);
         return operation(*lease);
     });
+}
+
+// Once for each row: whoever shows the history asks again and again.
+void LogDamaged(const Database& database, const StoreFailure& failure) {
+    static std::mutex mutex;
+    static std::set<std::string> logged;
+    constexpr std::size_t kMostLogged = 1000;
+    const std::lock_guard lock(mutex);
+    if (logged.size() < kMostLogged &&
+        logged.insert(database.File() + ": " + failure.what()).second) {
+        syslog(LOG_ERR, "task store %s: %s: it is left out", database.File().c_str(),
+               failure.what());
+    }
+}
+
+// A row that holds what no run can is left out.
+template <class ReadOne>
+void AddUndamaged(const Database& database, std::vector<Run>& runs, ReadOne readOne) {
+    try {
+        if (std::optional<Run> run = readOne()) {
+            runs.push_back(*std::move(run));
+        }
+    } catch (const StoreFailure& failure) {
+        LogDamaged(database, failure);
+    }
 }
 
 struct StateAndOutput {
@@ -33,25 +65,23 @@ std::shared_ptr<RunStore> RunStore::Current() {
 RunStore::RunStore(std::shared_ptr<TaskStore> taskStore) : store(std::move(taskStore)) {}
 
 RunStore::Page RunStore::List(const Filter& filter, std::int64_t offset, std::int64_t limit) {
-    return Reading(store->UsedDatabase(), [&](Connection& connection) {
+    Database& database = store->UsedDatabase();
+    return Reading(database, [&](Connection& connection) {
         Page page;
         page.total = CountRuns(connection, filter);
         for (const std::int64_t id : ReadRunIds(connection, filter, offset, limit)) {
-            if (std::optional<Run> run = ReadRun(connection, id)) {
-                page.runs.push_back(*std::move(run));
-            }
+            AddUndamaged(database, page.runs, [&] { return ReadRun(connection, id); });
         }
         return page;
     });
 }
 
 std::vector<Run> RunStore::Latest(const std::vector<int>& tasks) {
-    return Reading(store->UsedDatabase(), [&](Connection& connection) {
+    Database& database = store->UsedDatabase();
+    return Reading(database, [&](Connection& connection) {
         std::vector<Run> runs;
         for (const int task : tasks) {
-            if (std::optional<Run> run = ReadLatestRun(connection, task)) {
-                runs.push_back(*std::move(run));
-            }
+            AddUndamaged(database, runs, [&] { return ReadLatestRun(connection, task); });
         }
         return runs;
     });
@@ -79,6 +109,16 @@ std::optional<RunOutput> RunStore::Output(std::int64_t run) {
         stored = Reading(store->UsedDatabase(), read);
     }
     return stored ? std::optional(std::move(stored->output)) : std::nullopt;
+}
+
+bool RunStore::Cancel(std::int64_t run) {
+    Database& database = store->UsedDatabase();
+    return Guarded(database, [&] {
+        WriteTransaction transaction(database);
+        const bool cancelled = CancelQueued(*transaction, run);
+        transaction.Commit();
+        return cancelled;
+    });
 }
 
 std::int64_t RunStore::Revision() { return Reading(store->UsedDatabase(), ReadRevision); }

@@ -24,7 +24,7 @@ class RunStore {
     };
     struct Page {
         std::vector<Run> runs;
-        // How many the filter leaves altogether.
+        // How many the filter leaves altogether, damaged ones too.
         std::int64_t total = 0;
     };
 
@@ -33,7 +33,8 @@ class RunStore {
 
     explicit RunStore(std::shared_ptr<TaskStore> taskStore);
 
-    // The newest runs first. `offset` and `limit` are not negative.
+    // The newest runs first. `offset` and `limit` are not negative. Damaged ones are left out of
+    // the page, here and below, and logged.
     Page List(const Filter& filter, std::int64_t offset, std::int64_t limit);
 
     // Of each task that has any, in the order of `tasks`: the run that is going on, otherwise the
@@ -44,6 +45,10 @@ class RunStore {
 
     // What the run has printed, so far if it goes on. Nothing when there is no such run.
     std::optional<RunOutput> Output(std::int64_t run);
+
+    // Takes a run that waits for its start out of the queue: it counts as skipped, because it was
+    // stopped. False when it does not wait.
+    bool Cancel(std::int64_t run);
 
     // A number that grows with every change of tasks or runs, by whatever process.
     std::int64_t Revision();

@@ -43,12 +43,14 @@ bool RecordStart(Connection& connection, int task, std::int64_t occurrence) {
     return query->exec() > 0;
 }
 
-// Whether the start was skipped: nothing has been started then.
+// Whether the start was skipped: nothing has been started then. One that somebody has stopped stays
+// that.
 bool RemoveSkipped(Connection& connection, int task, std::int64_t occurrence) {
     Query query = connection.Prepare(
-        "DELETE FROM run WHERE task = ? AND occurrence = ? AND state = 'skipped'");
+        "DELETE FROM run WHERE task = ? AND occurrence = ? AND state = 'skipped' AND why != ?");
     query->bind(1, task);
     query->bind(2, occurrence);
+    query->bind(3, kWhyStopped);
     return query->exec() > 0;
 }
 
@@ -103,16 +105,25 @@ std::optional<std::int64_t> InsertRun(Connection& connection, const ScheduledRun
 
 std::vector<QueuedRun> ReadQueuedRuns(Connection& connection, std::int64_t after, int most) {
     Query query = connection.Prepare(
-        "SELECT id, coalesce(occurrence * 1000, queued_at) FROM run "
+        "SELECT id, task, coalesce(occurrence * 1000, queued_at), queued_at FROM run "
         "WHERE state = 'queued' AND id > ? ORDER BY id LIMIT ?");
     query->bind(1, after);
     query->bind(2, most);
     std::vector<QueuedRun> runs;
     while (query->executeStep()) {
-        runs.push_back(
-            {query->getColumn(0).getInt64(), absl::FromUnixMillis(query->getColumn(1).getInt64())});
+        runs.push_back({query->getColumn(0).getInt64(), query->getColumn(1).getInt(),
+                        absl::FromUnixMillis(query->getColumn(2).getInt64()),
+                        absl::FromUnixMillis(query->getColumn(3).getInt64())});
     }
     return runs;
+}
+
+bool HasQueuedRun(Connection& connection, int task) {
+    // A task has fewer runs than there may be in the queue.
+    Query query =
+        connection.Prepare("SELECT 1 FROM run WHERE task = ? AND +state = 'queued' LIMIT 1");
+    query->bind(1, task);
+    return query->executeStep();
 }
 
 std::optional<TaskOfRun> ReadTaskOfQueued(Connection& connection, std::int64_t run) {
@@ -129,10 +140,10 @@ std::optional<TaskOfRun> ReadTaskOfQueued(Connection& connection, std::int64_t r
         reason = ParseRunReason(query->getColumn(1).getText());
     }
     std::optional<TaskData> task = ReadTask(connection, id);
-    if (!task || !reason) {
+    if (!task) {
         return std::nullopt;
     }
-    return TaskOfRun{*std::move(task), *reason};
+    return TaskOfRun{*std::move(task), reason};
 }
 
 std::vector<RunningRun> ReadRunningRuns(Connection& connection) {
@@ -164,19 +175,24 @@ void MarkQueued(Connection& connection, std::int64_t run) {
     query->exec();
 }
 
-void MarkSkipped(Connection& connection, std::int64_t run, std::string_view why) {
-    Query query = connection.Prepare("UPDATE run SET state = 'skipped', why = ?2 WHERE id = ?1");
+bool MarkSkipped(Connection& connection, std::int64_t run, std::string_view why) {
+    Query query = connection.Prepare(
+        "UPDATE run SET state = 'skipped', why = ?2 WHERE id = ?1 AND state = 'queued'");
     query->bind(1, run);
     BindText(query, 2, why);
-    query->exec();
+    return query->exec() > 0;
+}
+
+bool CancelQueued(Connection& connection, std::int64_t run) {
+    return MarkSkipped(connection, run, kWhyStopped);
 }
 
 void MarkEnded(Connection& connection, std::int64_t run, const RunEnding& ending,
                const StoredOutput& output) {
-    InsertOutput(connection, run, output);
     Query query = connection.Prepare(
         "UPDATE run SET state = 'ended', started_at = ?2, ended_at = ?3, exit_status = ?4, "
-        "signal = ?5, why = ?6, output_bytes = ?7 WHERE id = ?1");
+        "signal = ?5, why = ?6, output_bytes = ?7 "
+        "WHERE id = ?1 AND state IN ('running', 'queued')");
     query->bind(1, run);
     query->bind(2);
     if (ending.started) {
@@ -193,24 +209,41 @@ void MarkEnded(Connection& connection, std::int64_t run, const RunEnding& ending
     }
     query->bindNoCopy(6, ending.why);
     query->bind(7, static_cast<std::int64_t>(output.bytes));
-    query->exec();
+    if (query->exec() > 0) {
+        InsertOutput(connection, run, output);
+    }
 }
 
 void MarkLost(Connection& connection, std::int64_t run, std::string_view why, absl::Time now,
               const StoredOutput& output) {
-    InsertOutput(connection, run, output);
     Query query = connection.Prepare(
-        "UPDATE run SET state = 'lost', why = ?2, ended_at = ?3, output_bytes = ?4 WHERE id = ?1");
+        "UPDATE run SET state = 'lost', why = ?2, ended_at = ?3, output_bytes = ?4 "
+        "WHERE id = ?1 AND state = 'running'");
     query->bind(1, run);
     BindText(query, 2, why);
     query->bind(3, absl::ToUnixMillis(now));
     query->bind(4, static_cast<std::int64_t>(output.bytes));
+    if (query->exec() > 0) {
+        InsertOutput(connection, run, output);
+    }
+}
+
+void RecordClockSet(Connection& connection, absl::Time now) {
+    {
+        Query query = connection.Prepare("DELETE FROM clock_set");
+        query->exec();
+    }
+    Query query =
+        connection.Prepare("INSERT INTO clock_set SELECT coalesce(max(id), 0), ? FROM run");
+    query->bind(1, absl::ToUnixMillis(now));
     query->exec();
 }
 
 absl::Time NewestRecord(Connection& connection) {
     Query query = connection.Prepare(
-        "SELECT max(queued_at) FROM (SELECT queued_at FROM run ORDER BY id DESC LIMIT ?)");
+        "SELECT max(at) FROM (SELECT at FROM clock_set UNION ALL SELECT * FROM "
+        "(SELECT queued_at FROM run WHERE id > coalesce((SELECT run FROM clock_set), 0) "
+        "ORDER BY id DESC LIMIT ?))");
     query->bind(1, kRecordsLookedAt);
     if (!query->executeStep() || query->getColumn(0).isNull()) {
         return absl::InfinitePast();

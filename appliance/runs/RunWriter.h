@@ -1,5 +1,5 @@
-// What the scheduler writes into the history. Functions throw SQLite::Exception and StoreFailure;
-// those that change something belong inside a Transaction.
+// What is written into the history, most of it by the scheduler. Functions throw SQLite::Exception
+// and StoreFailure; those that change something belong inside a Transaction.
 #pragma once
 
 #include <absl/time/time.h>
@@ -42,16 +42,23 @@ std::optional<std::int64_t> InsertRun(Connection& connection, const ScheduledRun
 
 struct QueuedRun {
     std::int64_t id = 0;
+    int task = 0;
     // The instant of the schedule; of a run by hand, when it was asked for.
     absl::Time due;
+    // When it was recorded.
+    absl::Time since;
 };
 
 // Up to `most` queued runs with an id above `after`, by id.
 std::vector<QueuedRun> ReadQueuedRuns(Connection& connection, std::int64_t after, int most);
 
+// Whether a run of the task is queued.
+bool HasQueuedRun(Connection& connection, int task);
+
 struct TaskOfRun {
     TaskData task;
-    RunReason reason = RunReason::kByHand;
+    // Nothing in a damaged row.
+    std::optional<RunReason> reason;
 };
 
 // The task of a run that is still queued, as the task is now. Nothing when run or task is gone.
@@ -73,15 +80,23 @@ void MarkRunning(Connection& connection, std::int64_t run, const std::string& bo
                  absl::Time now);
 // From running back to queued: its process was never started.
 void MarkQueued(Connection& connection, std::int64_t run);
-void MarkSkipped(Connection& connection, std::int64_t run, std::string_view why);
-// From running to ended, with what it printed.
+// From queued to skipped. False when it is not queued any more.
+bool MarkSkipped(Connection& connection, std::int64_t run, std::string_view why);
+// The same, because somebody has stopped it.
+bool CancelQueued(Connection& connection, std::int64_t run);
+// From running to ended, with what it printed; from queued, when it cannot be started. Nothing is
+// stored of a run that is neither.
 void MarkEnded(Connection& connection, std::int64_t run, const RunEnding& ending,
                const StoredOutput& output);
-// From running to lost, with what it had printed.
+// From running to lost, with what it had printed. Nothing is stored of a run that is not running.
 void MarkLost(Connection& connection, std::int64_t run, std::string_view why, absl::Time now,
               const StoredOutput& output);
 
-// The latest instant among the newest runs; InfinitePast when there is none.
+// The clock was set to `now`: the instants of all runs so far may come from one that was wrong.
+void RecordClockSet(Connection& connection, absl::Time now);
+
+// The latest instant among the newest runs and what the clock was last set to; InfinitePast when
+// there is neither. Runs from before the clock was set do not count.
 absl::Time NewestRecord(Connection& connection);
 
 // How much of the history is kept.

@@ -1,5 +1,7 @@
 #include "appliance/scheduler/PassedStarts.h"
 
+#include <algorithm>
+
 #include "appliance/schedule/StartTimes.h"
 
 namespace orva {
@@ -12,10 +14,11 @@ StartSecond StartBetween(const Schedule& schedule, const absl::TimeZone& zone, a
     return start && *start <= until ? absl::ToUnixSeconds(*start) : kNoStart;
 }
 
-// The last start from `stored` to `until`.
+// The last start after `stored` and `since` that is at `until` or before; `stored` when there is
+// none.
 StartSecond LatestStart(const Schedule& schedule, const absl::TimeZone& zone, StartSecond stored,
-                        absl::Time until) {
-    const absl::Time first = absl::FromUnixSeconds(stored);
+                        StartSecond since, absl::Time until) {
+    const absl::Time first = absl::FromUnixSeconds(std::max(stored, since));
     StartSecond latest = StartBetween(schedule, zone, first, until);
     if (latest == kNoStart) {
         return stored;
@@ -38,12 +41,12 @@ StartSecond LatestStart(const Schedule& schedule, const absl::TimeZone& zone, St
 }  // namespace
 
 PassedStarts FindPassedStarts(const Schedule& schedule, const absl::TimeZone& zone,
-                              StartSecond stored, absl::Time now) {
+                              StartSecond stored, StartSecond since, absl::Time now) {
     PassedStarts passed;
-    passed.latest = LatestStart(schedule, zone, stored, now);
+    passed.latest = LatestStart(schedule, zone, stored, since, now);
     if (passed.latest != stored) {
         passed.before =
-            LatestStart(schedule, zone, stored, absl::FromUnixSeconds(passed.latest - 1));
+            LatestStart(schedule, zone, stored, since, absl::FromUnixSeconds(passed.latest - 1));
     }
     return passed;
 }

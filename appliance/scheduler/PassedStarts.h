@@ -16,9 +16,10 @@ struct PassedStarts {
     std::optional<StartSecond> before;
 };
 
-// Of the starts from `stored` on, which is one itself and not later than `now`. The effort grows
-// with the logarithm of the time that has passed, not with the number of starts.
+// Of the starts from `stored` on, which is one itself and not later than `now`; and of the others
+// those after `since`, from when on the schedule holds. The effort grows with the logarithm of the
+// time that has passed, not with the number of starts.
 PassedStarts FindPassedStarts(const Schedule& schedule, const absl::TimeZone& zone,
-                              StartSecond stored, absl::Time now);
+                              StartSecond stored, StartSecond since, absl::Time now);
 
 }  // namespace orva

@@ -13,7 +13,8 @@ PlannedStart Skipped(StartSecond occurrence, std::string_view why) {
     return {occurrence, RunReason::kSchedule, why};
 }
 
-PlannedStart PlanLatest(const TaskData& task, StartSecond latest, const Moment& moment) {
+PlannedStart PlanLatest(const TaskData& task, StartSecond latest, StartSecond since,
+                        const Moment& moment) {
     if (!task.Has(kEnabled)) {
         return Skipped(latest, kWhyDisabled);
     }
@@ -23,7 +24,8 @@ PlannedStart PlanLatest(const TaskData& task, StartSecond latest, const Moment& 
     const absl::Time start = absl::FromUnixSeconds(latest);
     const absl::Duration late = moment.now - start;
     const bool onTime = late <= kOnTime;
-    if (!onTime && !(task.schedule.runMissed && late <= kMissedPatience)) {
+    const bool madeUpFor = task.schedule.runMissed && late <= kMissedPatience && latest > since;
+    if (!onTime && !madeUpFor) {
         return Skipped(latest, WhyMissed(start, moment));
     }
     if (task.command.empty()) {
@@ -34,7 +36,8 @@ PlannedStart PlanLatest(const TaskData& task, StartSecond latest, const Moment& 
 
 }  // namespace
 
-DuePlan PlanDueTask(const TaskData& task, StartSecond due, const Moment& moment) {
+DuePlan PlanDueTask(const TaskData& task, StartSecond due, StartSecond since,
+                    const Moment& moment) {
     DuePlan plan;
     plan.next = ComputeNextStart(task, moment.zone, moment.now);
     if (!task.Has(kEnabled)) {
@@ -42,8 +45,9 @@ DuePlan PlanDueTask(const TaskData& task, StartSecond due, const Moment& moment)
         plan.starts.push_back(Skipped(due, kWhyDisabled));
         return plan;
     }
-    const PassedStarts passed = FindPassedStarts(task.schedule, moment.zone, due, moment.now);
-    const PlannedStart latest = PlanLatest(task, passed.latest, moment);
+    const PassedStarts passed =
+        FindPassedStarts(task.schedule, moment.zone, due, since, moment.now);
+    const PlannedStart latest = PlanLatest(task, passed.latest, since, moment);
     if (passed.before && latest.why.empty() && latest.reason == RunReason::kSchedule) {
         const absl::Time before = absl::FromUnixSeconds(*passed.before);
         plan.starts.push_back(Skipped(*passed.before, WhyMissed(before, moment)));
@@ -52,8 +56,8 @@ DuePlan PlanDueTask(const TaskData& task, StartSecond due, const Moment& moment)
     return plan;
 }
 
-std::string_view WhyNotResumed(absl::Time due, const Moment& moment) {
-    return moment.now - due <= kQueuePatience ? std::string_view() : WhyMissed(due, moment);
+std::string_view WhyNoLongerStarted(absl::Time since, const Moment& moment) {
+    return moment.now - since <= kQueuePatience ? std::string_view() : WhyMissed(since, moment);
 }
 
 void RunningTasks::Add(int task, const std::string& app) {

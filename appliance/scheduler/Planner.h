@@ -20,8 +20,7 @@ namespace orva {
 // A start that comes so late still counts as one of its time: the machine was busy, or the
 // scheduler was being replaced.
 inline constexpr absl::Duration kOnTime = absl::Minutes(1);
-// A start that waited for others when the scheduler ended is still made by the next one for so
-// long.
+// So long a run waits for its start, also over a restart of the scheduler.
 inline constexpr absl::Duration kQueuePatience = absl::Hours(1);
 // How old the start may be that a task with "run missed" makes up for.
 inline constexpr absl::Duration kMissedPatience = absl::Hours(24);
@@ -33,6 +32,7 @@ inline constexpr std::string_view kWhyMissed = "missed";
 inline constexpr std::string_view kWhyMachineOff = "machine off";
 inline constexpr std::string_view kWhyClock = "clock not trusted";
 inline constexpr std::string_view kWhyNoCommand = "no command";
+inline constexpr std::string_view kWhyDeleted = "deleted";
 
 // What is known besides the task.
 struct Moment {
@@ -61,11 +61,12 @@ struct DuePlan {
 };
 
 // What becomes of a task whose next start, as stored, has come. Of starts that were missed the
-// latest one goes into the history and stands for all.
-DuePlan PlanDueTask(const TaskData& task, StartSecond due, const Moment& moment);
+// latest one goes into the history and stands for all. `since` says from when on the task has its
+// schedule, or is enabled: a save makes no start of a time before it, and has none made up for.
+DuePlan PlanDueTask(const TaskData& task, StartSecond due, StartSecond since, const Moment& moment);
 
-// Why a start that waited when the scheduler ended is not made any more; empty when it is.
-std::string_view WhyNotResumed(absl::Time due, const Moment& moment);
+// Why a run that has waited since then is not started any more; empty when it is.
+std::string_view WhyNoLongerStarted(absl::Time since, const Moment& moment);
 
 // The tasks that have a run going on.
 class RunningTasks {

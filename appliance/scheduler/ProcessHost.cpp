@@ -29,6 +29,9 @@ constexpr std::uint64_t kReadInterval = 500 * kMillisecond;
 constexpr std::uint64_t kStopInterval = 100 * kMillisecond;
 constexpr std::uint64_t kTimeToStop = 10'000 * kMillisecond;
 
+// Whether errno says that it may be otherwise in a moment.
+bool LacksResources() { return errno == EMFILE || errno == ENFILE || errno == ENOMEM; }
+
 }  // namespace
 
 // What is known of a run that goes on.
@@ -38,8 +41,6 @@ struct ProcessHost::Watch {
     ProcessHost& host;
     const std::int64_t run;
     const RunFolder folder;
-    // Of the supervisor, when it is a child of this process; else 0.
-    pid_t child = 0;
     // Whose end is waited for: the supervisor, or the killed shell of one that is gone.
     FileDescriptor process;
     EventSource processSource;
@@ -61,25 +62,33 @@ ProcessHost::ProcessHost(sd_event* eventLoop, std::string supervisorProgram,
 
 ProcessHost::~ProcessHost() = default;
 
-std::optional<std::string> ProcessHost::Start(const RunOrder& order) {
-    RunFolder folder(order.run);
+std::optional<std::string> ProcessHost::Prepare(const RunOrder& order) {
     std::string error;
-    std::optional<FileDescriptor> lock = folder.Create(order, error);
+    std::optional<FileDescriptor> lock = RunFolder(order.run).Create(order, error);
     if (!lock) {
         return error;
     }
-    const std::optional<pid_t> child = StartSupervisor(program, folder, *std::move(lock), error);
+    prepared[order.run] = *std::move(lock);
+    return std::nullopt;
+}
+
+std::optional<std::string> ProcessHost::Start(std::int64_t run) {
+    std::string error;
+    const auto lock = prepared.extract(run);
+    const std::optional<pid_t> child =
+        StartSupervisor(program, RunFolder(run), std::move(lock.mapped()), error);
     if (!child) {
-        folder.Remove();
         return error;
     }
-    Watch& watch = Observe(order.run);
-    watch.child = *child;
-    WatchProcess(watch, FileDescriptor(static_cast<int>(::syscall(SYS_pidfd_open, *child, 0))));
+    WatchProcess(Observe(run),
+                 FileDescriptor(static_cast<int>(::syscall(SYS_pidfd_open, *child, 0))));
     return std::nullopt;
 }
 
 RunHost::Trace ProcessHost::Look(std::int64_t run) {
+    if (watches.count(run) != 0) {
+        return Trace::kGoesOn;
+    }
     switch (RunFolder(run).Look()) {
         case RunFolder::State::kNotBegun:
             return Trace::kNotBegun;
@@ -95,20 +104,30 @@ RunHost::Trace ProcessHost::Look(std::int64_t run) {
         case RunFolder::State::kUnknown:
             break;
     }
-    LookAgain(Observe(run));
+    // From the loop: it may have ended by now.
+    LookLater(Observe(run), 0);
     return Trace::kGoesOn;
 }
 
-std::optional<RunEnding> ProcessHost::Ending(std::int64_t run) const {
-    return RunFolder(run).Ending();
-}
-
-StoredOutput ProcessHost::Output(std::int64_t run) const {
-    return RunFolder(run).Output().value_or(StoredOutput());
+std::optional<RunRemains> ProcessHost::Remains(std::int64_t run) const {
+    const RunFolder folder(run);
+    errno = 0;
+    RunRemains remains;
+    remains.ending = folder.Ending();
+    if (!remains.ending && LacksResources()) {
+        return std::nullopt;
+    }
+    if (std::optional<StoredOutput> output = folder.Output()) {
+        remains.output = *std::move(output);
+    } else if (LacksResources()) {
+        return std::nullopt;
+    }
+    return remains;
 }
 
 void ProcessHost::Remove(std::int64_t run) {
     watches.erase(run);
+    prepared.erase(run);
     // A folder that cannot be removed has been logged; the next scheduler tries again.
     static_cast<void>(RunFolder(run).Remove());
 }
@@ -117,10 +136,14 @@ std::vector<std::int64_t> ProcessHost::All() const { return RunFolder::All(); }
 
 void ProcessHost::Stop(std::int64_t run) {
     const auto found = watches.find(run);
-    if (found == watches.end() || found->second->killAt != 0) {
+    if (found == watches.end()) {
         return;
     }
     Watch& watch = *found->second;
+    ResumeStop(watch);
+    if (watch.killAt != 0) {
+        return;
+    }
     watch.killAt = MonotonicNow() + kTimeToStop;
     // Before the first signal: a supervisor whose shell that ends must know why.
     if (!watch.folder.RecordStop(watch.killAt)) {
@@ -200,10 +223,16 @@ void ProcessHost::LookAgain(Watch& watch) {
 
 // False when there is nothing to wait for.
 bool ProcessHost::KillAbandoned(Watch& watch) {
-    if (std::exchange(watch.wasKilledAbandoned, true)) {
+    if (watch.wasKilledAbandoned) {
         return false;
     }
+    errno = 0;
     FileDescriptor shell = watch.folder.KillAbandonedCommand();
+    if (!shell.IsOpen() && LacksResources()) {
+        LookLater(watch, kReadInterval);
+        return true;
+    }
+    watch.wasKilledAbandoned = true;
     if (!shell.IsOpen()) {
         return false;
     }
@@ -247,8 +276,8 @@ void ProcessHost::ContinueStop(Watch& watch) {
 }
 
 void ProcessHost::End(Watch& watch) {
-    if (watch.child != 0) {
-        ::waitpid(watch.child, nullptr, WNOHANG);
+    // Of those that are children of this process; also of runs that it has forgotten.
+    while (::waitpid(-1, nullptr, WNOHANG) > 0) {
     }
     const std::int64_t run = watch.run;
     watches.erase(run);

@@ -28,10 +28,10 @@ class ProcessHost final : public RunHost {
     ~ProcessHost() override;
 
     const std::string& BootId() const override { return bootId; }
-    std::optional<std::string> Start(const RunOrder& order) override;
+    std::optional<std::string> Prepare(const RunOrder& order) override;
+    std::optional<std::string> Start(std::int64_t run) override;
     Trace Look(std::int64_t run) override;
-    std::optional<RunEnding> Ending(std::int64_t run) const override;
-    StoredOutput Output(std::int64_t run) const override;
+    std::optional<RunRemains> Remains(std::int64_t run) const override;
     void Remove(std::int64_t run) override;
     std::vector<std::int64_t> All() const override;
     // SIGTERM to the command's process group, SIGKILL 10 seconds later: by this host, or by the one
@@ -54,6 +54,8 @@ class ProcessHost final : public RunHost {
     const std::string program;
     const std::function<void(std::int64_t)> onEnded;
     const std::string bootId;
+    // The locks of runs that were prepared and have not begun.
+    std::map<std::int64_t, FileDescriptor> prepared;
     std::map<std::int64_t, std::unique_ptr<Watch>> watches;
 };
 

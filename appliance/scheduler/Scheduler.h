@@ -20,6 +20,7 @@
 #include "appliance/scheduler/ClockTrust.h"
 #include "appliance/scheduler/Planner.h"
 #include "appliance/scheduler/RunHost.h"
+#include "appliance/scheduler/WaitingRuns.h"
 #include "appliance/store/TaskStore.h"
 #include "appliance/store/TaskTable.h"
 
@@ -50,8 +51,8 @@ class Scheduler {
     // All three must outlive the scheduler.
     Scheduler(TaskStore& taskStore, RunHost& runHost, Options schedulerOptions);
 
-    // Takes over what an earlier scheduler has left. Comes before anything else, until it has
-    // succeeded once.
+    // Takes over what an earlier scheduler has left. Work() does the same before anything else, and
+    // again when another database has taken the place of the former one.
     void Recover();
 
     // Does a part of what there is to do. Yields when to be called again at the latest: a time that
@@ -65,7 +66,9 @@ class Scheduler {
     // Throws nothing.
     void SetMostRuns(std::size_t mostRuns) { options.mostRuns = mostRuns; }
 
-    // Ends a run. Nothing when that is under way, else why it cannot be.
+    // Ends a run that goes on, or takes one that waits out of the queue. Nothing when that is done
+    // or under way, else why it cannot be: before Recover() has succeeded nobody knows what goes
+    // on.
     std::optional<std::string> Stop(std::int64_t run);
 
     // Removes some of the runs that are too old to be kept. True as long as there may be more.
@@ -77,11 +80,15 @@ class Scheduler {
     struct RunningTask {
         int task = 0;
         std::string app;
+        // It has ended, and its row does not say so yet.
+        bool over = false;
     };
     struct EndedRun {
         std::int64_t run = 0;
         // What is said of it when nobody knows how it ended.
         std::string_view whyLost;
+        // It has been logged that what it has left cannot be read.
+        bool saidUnreadable = false;
     };
     struct Beginning {
         RunOrder order;
@@ -89,9 +96,16 @@ class Scheduler {
     };
     // What one transaction does, for what is to follow its commit.
     struct Step {
-        // So many of the first ended runs are stored.
+        // Its database is not the one that was taken over; nothing was done.
+        bool otherDatabase = false;
+        // So many of the first ended runs are dealt with; these of them cannot be read for now.
         std::size_t endings = 0;
+        std::set<std::int64_t> unreadable;
         std::vector<Beginning> beginnings;
+        bool moreDue = false;
+        bool recordsClock = false;
+        // Up to which task next starts are corrected.
+        std::optional<std::int64_t> corrected;
         // Tasks that are left out from now on.
         std::vector<DamagedTask> damaged;
         // The tasks that have runs going on after it.
@@ -100,21 +114,32 @@ class Scheduler {
 
     absl::Time Now() const { return store.Now(); }
     Moment CurrentMoment();
+    bool HasTakenOver();
+    void ForgetAll();
     void TakeOver(Connection& connection, const RunningRun& run);
-    void ResumeQueue(Connection& connection, const Moment& moment);
+    void Ended(std::int64_t run, std::string_view whyLost);
     bool HasWork(const Moment& moment);
     void DoWork(const Moment& moment);
+    void StoreStep(const Moment& moment, Step& step);
     static void LeaveOut(Connection& connection, const std::vector<DamagedTask>& tasks, Step& step);
-    void StoreEndings(Connection& connection, const Moment& moment, std::size_t endings);
-    bool RecordDueTasks(Connection& connection, const Moment& moment, Step& step);
+    void StoreEndings(Connection& connection, const Moment& moment, Step& step);
+    void ForgetEnded(const Step& step);
+    void RecordDueTasks(Connection& connection, const Moment& moment, Step& step);
+    bool WaitsAlready(Connection& connection, const TaskData& task) const;
     void ReadQueue(Connection& connection);
+    void SkipOutdated(Connection& connection, const Moment& moment);
     void StartQueued(Connection& connection, const Moment& moment, Step& step);
-    std::optional<std::int64_t> CorrectStarts(Connection& connection, const Moment& moment,
-                                              Step& step) const;
+    void StartOrEnd(Connection& connection, const Moment& moment, std::int64_t run, Step& step);
+    void StartRun(Connection& connection, const Moment& moment, std::int64_t run,
+                  const TaskData& task, Step& step);
+    void CorrectStarts(Connection& connection, const Moment& moment, Step& step) const;
     void Begin(const Beginning& beginning);
-    void ForgetQueue();
+    // The ending of a run that could not be started, and why.
+    static RunEnding NotStarted(absl::Time now, std::string why);
     bool Corrects(const Moment& moment) const;
+    bool RecordsClock(const Moment& moment) const;
     bool CanStart() const;
+    bool HasOutdated(const Moment& moment) const;
     absl::Time NextCall(const Moment& moment);
 
     TaskStore& store;
@@ -122,14 +147,17 @@ class Scheduler {
     Options options;
     ClockTrust clock;
 
-    // Runs that wait, in the order in which they are to start: a copy of what the store holds.
-    std::set<std::pair<absl::Time, std::int64_t>> queue;
-    std::int64_t lastQueued = 0;
+    // The database that was taken over, as Database::Generation() counts; 0 before.
+    std::uint64_t generation = 0;
+
+    WaitingRuns waiting;
     std::map<std::int64_t, RunningTask> running;
     // Of those runs the ones that have not ended.
     RunningTasks runningTasks;
-    // Runs that have ended and whose rows still say that they go on.
+    // Runs that have ended and whose rows still say that they go on; and those of them whose
+    // endings could not be read, which are tried again after a while.
     std::deque<EndedRun> ended;
+    std::deque<EndedRun> unreadable;
     // Why runs could not be begun, until that is stored.
     std::map<std::int64_t, RunEnding> failedStarts;
 
@@ -138,6 +166,8 @@ class Scheduler {
     std::optional<std::int64_t> corrected = 0;
     absl::TimeZone zoneOfStarts;
     bool clockTrusted = true;
+    // The clock was set, and that is not stored yet.
+    bool clockWasSet = false;
     bool moreDue = false;
     // Up to which task old runs have been removed.
     int trimmedTask = 0;

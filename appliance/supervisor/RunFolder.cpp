@@ -195,7 +195,7 @@ RunFolder::State RunFolder::Look() const {
         case Lock::kHeld:
             return State::kSupervised;
         case Lock::kNoFile:
-            return State::kNotBegun;
+            return State::kAbandoned;
         case Lock::kFree:
             break;
     }

@@ -48,13 +48,16 @@ class RunFolder {
         kNotBegun,    // nobody cares for it, and its command has not been started
         kSupervised,  // a supervisor cares for it, or the scheduler is about to start one
         kEnded,       // there is an ending
-        kAbandoned,   // nobody cares for it any more, and no ending will ever be recorded
+        kAbandoned,   // nobody cares for it any more, or somebody has removed it or its process
+                      // file; no ending will ever be recorded
     };
     [[nodiscard]] State Look() const;
 
     // Whether somebody certainly holds the lock. That may be so for a moment after the ending.
     [[nodiscard]] bool IsSupervised() const;
 
+    // These set errno when a file cannot be read.
+    //
     // None when it is not there, or not complete.
     [[nodiscard]] std::optional<RunOrder> Order() const;
     // None until the supervisor runs.
@@ -78,7 +81,8 @@ class RunFolder {
 
     // Kills the process group of the command in a folder that is kAbandoned. A pidfd of the
     // command's shell, readable when that has ended. Not open when the shell is not there any more,
-    // or is not certainly the one that was started; then nothing is killed.
+    // or is not certainly the one that was started; then nothing is killed. Sets errno when
+    // something cannot be read.
     [[nodiscard]] FileDescriptor KillAbandonedCommand() const;
 
     // Removes the folder and what is in it. False with a log line when that fails; true when there

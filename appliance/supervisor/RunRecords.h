@@ -45,6 +45,10 @@ struct RunProcess {
     bool operator==(const RunProcess&) const = default;
 };
 
+// What the history says of a run that somebody has stopped, before its start or after. Stored: it
+// never changes.
+inline constexpr const char* kWhyStopped = "stopped";
+
 // How a run ended.
 struct RunEnding {
     std::optional<RunTime> started;  // none: the command was not started
@@ -52,7 +56,8 @@ struct RunEnding {
     // Exactly one of the two when the command was started; none otherwise.
     std::optional<int> exitStatus;
     std::optional<int> signal;
-    std::string why;  // why it could not be started; empty when it was
+    // Why it could not be started; kWhyStopped when it was and somebody has stopped it; else empty.
+    std::string why;
 
     bool operator==(const RunEnding&) const = default;
 };

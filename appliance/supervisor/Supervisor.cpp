@@ -31,6 +31,10 @@ namespace {
 constexpr int kPipeSize = 256 * 1024;
 constexpr mode_t kEndingMode = 0640;
 
+// The run's folder, which the supervisor stays in: the scheduler may have removed it and made
+// another one under its name, when it had to start again with another database.
+constexpr const char* kHere = ".";
+
 // How often a stopped command's group is looked at that outlives its shell.
 constexpr int kShortestPause = 5;  // milliseconds
 constexpr int kLongestPause = 200;
@@ -52,8 +56,10 @@ bool WriteAll(int file, std::string_view content) {
     return true;
 }
 
-std::optional<RunOrder> ReadOrder(const std::string& folder) {
-    const FileDescriptor file(::open((folder + kOrderFile).c_str(), O_RDONLY | O_CLOEXEC));
+std::string PathOf(const char* file) { return std::string(kHere) + file; }
+
+std::optional<RunOrder> ReadOrder() {
+    const FileDescriptor file(::open(PathOf(kOrderFile).c_str(), O_RDONLY | O_CLOEXEC));
     std::string records;
     std::array<char, 4096> buffer{};
     ssize_t got = 0;
@@ -63,23 +69,23 @@ std::optional<RunOrder> ReadOrder(const std::string& folder) {
     return OrderFromRecords(records);
 }
 
-bool SyncFolder(const std::string& path) {
-    const FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+bool SyncFolder(const char* path) {
+    const FileDescriptor folder(::open(path, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     return folder.IsOpen() && ::fsync(folder.Get()) == 0;
 }
 
 // Puts the ending into the space that was kept for it, then gives that its name: it is seen whole
 // or not at all, after a power cut too.
-bool WriteEnding(const std::string& folder, const RunEnding& ending) {
-    const std::string reserve = folder + kEndingReserve;
+bool WriteEnding(const RunEnding& ending) {
+    const std::string reserve = PathOf(kEndingReserve);
     const std::string records = ToRecords(ending);
     const FileDescriptor file(
         ::open(reserve.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, kEndingMode));
     return file.IsOpen() && WriteAll(file.Get(), records) &&
            ::ftruncate(file.Get(), static_cast<off_t>(records.size())) == 0 &&
            ::fsync(file.Get()) == 0 &&
-           ::rename(reserve.c_str(), (folder + kEndingFile).c_str()) == 0 && SyncFolder(folder) &&
-           SyncFolder(folder + "/..");
+           ::rename(reserve.c_str(), PathOf(kEndingFile).c_str()) == 0 && SyncFolder(kHere) &&
+           SyncFolder("..");
 }
 
 // By errno.
@@ -90,8 +96,8 @@ std::string CannotKeepOutput() {
 }
 
 // What setpriv has to say, as the end of a sentence.
-std::string FirstLineOf(const std::string& output) {
-    const std::optional<StoredOutput> stored = ReadOutput(output);
+std::string FirstLineOfOutput() {
+    const std::optional<StoredOutput> stored = ReadOutput(PathOf(kOutputFile));
     const std::string line = stored ? stored->head.substr(0, stored->head.find('\n')) : "";
     return line.empty() ? line : ": " + line;
 }
@@ -102,10 +108,12 @@ void IgnoreRequestsToEnd() {
     }
 }
 
+// False with errno.
 bool SayWhoWeAre() {
     const pid_t self = ::getpid();
-    const RunProcess process{BootId(), self, ProcessStart(self).value_or(0), 0};
-    return WriteAll(kSupervisorLock, SupervisorRecords(process));
+    const std::string boot = BootId();
+    const std::optional<std::uint64_t> start = boot.empty() ? std::nullopt : ProcessStart(self);
+    return start && WriteAll(kSupervisorLock, SupervisorRecords({boot, self, *start}));
 }
 
 // When the command is to be killed; 0 when nobody has asked for a stop.
@@ -195,6 +203,7 @@ class OutputPipe {
         ::fcntl(reading.Get(), F_SETFL, 0);
         ::dup2(reading.Get(), STDIN_FILENO);
         ::close_range(STDIN_FILENO + 1, ~0U, 0);
+        static_cast<void>(::chdir("/"));
         while (::read(STDIN_FILENO, buffer.data(), buffer.size()) > 0) {
         }
         ::_exit(EXIT_SUCCESS);
@@ -218,7 +227,8 @@ class OutputPipe {
 // One run, from its order to its ending.
 class SupervisedRun {
   public:
-    explicit SupervisedRun(std::string runFolder) : folder(std::move(runFolder)) {}
+    // `runName` is for the log.
+    explicit SupervisedRun(std::string runName) : name(std::move(runName)) {}
 
     RunEnding Run() {
         RunEnding ending;
@@ -230,7 +240,7 @@ class SupervisedRun {
         const bool shellRuns = command->WaitForShell(why);
         ending.started = RunTimeNow();
         pipe.KeepUntilEnd(*output, command->Watch());
-        EndStoppedGroup();
+        const bool stopped = EndStoppedGroup();
         ending.ended = RunTimeNow();
 
         // Not reaped yet: as long as the ending is not written, the command's id must not become
@@ -245,7 +255,10 @@ class SupervisedRun {
             ending.exitStatus = info.si_status;
         } else {
             ending.started.reset();
-            ending.why = why + FirstLineOf(folder + kOutputFile);
+            ending.why = why + FirstLineOfOutput();
+        }
+        if (stopped && ending.why.empty()) {
+            ending.why = kWhyStopped;
         }
         static_cast<void>(output->Sync());
         return ending;
@@ -261,18 +274,18 @@ class SupervisedRun {
 
   private:
     // A stop is for all that runs in the command's group. As long as the shell is not reaped, the
-    // group's id is given to nobody else.
-    void EndStoppedGroup() {
+    // group's id is given to nobody else. False when nobody has asked for one.
+    bool EndStoppedGroup() {
         const std::uint64_t killAt = KillTime();
         if (killAt == 0) {
-            return;
+            return false;
         }
         int pause = kShortestPause;
         while (HasLivingProcess(command->Id())) {
             const std::uint64_t now = MonotonicNow();
             if (now >= killAt + kTimeToDie) {
                 syslog(LOG_ERR, "%s: processes of the stopped command cannot be killed",
-                       folder.c_str());
+                       name.c_str());
                 break;
             }
             if (now >= killAt) {
@@ -282,6 +295,7 @@ class SupervisedRun {
             pause = std::min(pause * 2, kLongestPause);
         }
         pipe.KeepWhatIsThere(*output);
+        return true;
     }
 
     // False with the ending's `why` set.
@@ -291,7 +305,7 @@ class SupervisedRun {
             ending.why = CannotKeepOutput();
             return false;
         }
-        const std::optional<RunOrder> order = ReadOrder(folder);
+        const std::optional<RunOrder> order = ReadOrder();
         if (!order) {
             ending.why = "its order cannot be read";
             return false;
@@ -300,7 +314,7 @@ class SupervisedRun {
         if (!owner) {
             return false;
         }
-        output = OutputWriter::Create(folder + kOutputFile);
+        output = OutputWriter::Create(PathOf(kOutputFile));
         if (!output || !pipe.Open()) {
             ending.why = CannotKeepOutput();
             return false;
@@ -319,7 +333,7 @@ class SupervisedRun {
         return true;
     }
 
-    const std::string folder;
+    const std::string name;
     OutputPipe pipe;
     std::optional<OutputWriter> output;
     std::optional<StartedCommand> command;
@@ -330,8 +344,12 @@ class SupervisedRun {
 bool Supervise(const std::string& folder) {
     IgnoreRequestsToEnd();
     ::fcntl(kSupervisorLock, F_SETFD, FD_CLOEXEC);
+    if (::chdir(folder.c_str()) != 0) {
+        syslog(LOG_ERR, "cannot enter %s: %s", folder.c_str(), std::strerror(errno));
+        return false;
+    }
     SupervisedRun run(folder);
-    const bool written = WriteEnding(folder, run.Run());
+    const bool written = WriteEnding(run.Run());
     if (!written) {
         syslog(LOG_ERR, "cannot write the ending of %s: %s", folder.c_str(), std::strerror(errno));
     }

@@ -218,7 +218,9 @@ TEST_F(RunTest, AStoppedRunEndsWithTheWholeGroupOfItsCommand) {
     ASSERT_TRUE(WaitUntil([shell] { return StateOf(shell) == 'Z'; }));
     EXPECT_FALSE(run.Folder().Ending());
     run.Root().Write("go", "");
-    EXPECT_EQ(run.End().signal, SIGTERM);
+    const RunEnding ending = run.End();
+    EXPECT_EQ(ending.signal, SIGTERM);
+    EXPECT_EQ(ending.why, "stopped");
     EXPECT_EQ(run.Printed(), "first\nready\nlast\n");
 }
 
@@ -231,6 +233,19 @@ TEST_F(RunTest, AStopKillsWhatOutlivesTheShellWhenItsTimeHasCome) {
     ASSERT_TRUE(run.Folder().SignalCommand(SIGTERM));
     EXPECT_EQ(run.End().signal, SIGTERM);
     EXPECT_TRUE(StateOf(left) == 'Z' || StateOf(left) == 0);
+}
+
+TEST_F(RunTest, ACommandThatEndsInItsOwnWayWhenItIsStoppedKeepsItsExitStatus) {
+    run.Start("trap 'echo tidied; exit 7' TERM; echo ready; while :; do sleep 0.01; done");
+    ASSERT_TRUE(WaitUntil([this] { return run.Printed() == "ready\n"; }));
+    ASSERT_TRUE(run.Folder().RecordStop(orva::MonotonicNow() + 1'000'000'000));
+    ASSERT_TRUE(run.Folder().SignalCommand(SIGTERM));
+    const RunEnding ending = run.End();
+    EXPECT_EQ(ending.exitStatus, 7);
+    EXPECT_FALSE(ending.signal);
+    EXPECT_EQ(ending.why, "stopped");
+    // The shell has its own to say in between.
+    EXPECT_TRUE(run.Printed().ends_with("tidied\n")) << run.Printed();
 }
 
 TEST_F(RunTest, KeepsAllThatWasPrintedBeforeTheShellEnded) {

@@ -62,6 +62,7 @@ TEST_F(SchedulerStopTest, AStopHoldsWhenTheSchedulerIsKilledMeanwhile) {
     appliance.Start();
     EXPECT_TRUE(appliance.WaitForState(run, RunState::kEnded));
     EXPECT_EQ(appliance.OnlyRunOf(task).signal, SIGKILL);
+    EXPECT_EQ(appliance.OnlyRunOf(task).why, "stopped");
     EXPECT_GE(absl::Now() - asked, absl::Seconds(10));
     EXPECT_FALSE(Lives("up"));
 }

@@ -18,6 +18,8 @@ class TaskStoreAtStartTest : public testing::Test {
   protected:
     TaskStoreAtStartTest() : server({ORVA_LIB_DIR "/ORVA.Core.TaskScheduler.so"}) {}
 
+    std::string List() const { return server.Post("ORVA.Core.TaskScheduler/1/list", "{}").body; }
+
     RunningServer server;
 };
 
@@ -25,10 +27,20 @@ TEST_F(TaskStoreAtStartTest, IsReportedWhenItIsDamaged) {
     const std::string content(8192, 'x');
     const std::string file = server.Root().Write(kDatabase, content);
     server.Start();
-    EXPECT_THAT(server.Process().ErrorText(), HasSubstr("task store " + file + ": "));
-    EXPECT_EQ(server.Post("ORVA.Core.TaskScheduler/1/list", "{}").status, 200);
+    EXPECT_THAT(server.Process().ErrorText(),
+                HasSubstr("task store " + file + ": file is not a database\n"));
+    EXPECT_EQ(List(),
+              R"({"success":false,"error":{"code":117,"details":{"msg":"get task list failed"}}})");
     EXPECT_EQ(server.Process().Stop(), 0);
     EXPECT_EQ(orva::test::ReadWholeFile(file), content);
+}
+
+TEST_F(TaskStoreAtStartTest, IsUsedAsSoonAsItsDamageIsMended) {
+    const std::string file = server.Root().Write(kDatabase, std::string(8192, 'x'));
+    server.Start();
+    EXPECT_THAT(List(), HasSubstr("\"code\":117"));
+    std::filesystem::remove(file);
+    EXPECT_EQ(List(), R"({"success":true,"data":{"tasks":[],"total":0}})");
 }
 
 TEST_F(TaskStoreAtStartTest, IsNotMadeWhereThereIsNone) {

@@ -83,10 +83,33 @@ TEST_F(OrvapkgTest, NamesWhatFails) {
     EXPECT_EQ(Run({"status", "bad"}).status, 1);
 }
 
+TEST_F(OrvapkgTest, ARootThatIsNotThereIsNoApplianceWithoutPackages) {
+    const std::string root = (sandbox.Path() / "typo").string();
+    const ProcessResult result =
+        orva::test::RunProcess({ORVA_BIN_DIR "/orvapkg", "--root", root, "list"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, "orvapkg: the root " + root + ": No such file or directory\n");
+    EXPECT_FALSE(std::filesystem::exists(root));
+}
+
 TEST_F(OrvapkgTest, WrongUsageIsTold) {
-    for (const std::vector<std::string>& arguments :
-         {std::vector<std::string>{}, {"start"}, {"start", "a", "b"}, {"restart", "a"}, {"--x"}}) {
-        EXPECT_EQ(Run(arguments).status, 2);
+    struct Wrong {
+        std::vector<std::string> arguments;
+        const char* problem;
+    };
+    const std::vector<Wrong> wrong = {{{}, "A subcommand is required"},
+                                      {{"start"}, "ID is required"},
+                                      {{"start", "a", "b"}, "unknown argument 'b'"},
+                                      {{"start", "--x"}, "unknown argument '--x'"},
+                                      {{"restart", "a"}, "unknown argument 'restart'"},
+                                      {{"--x"}, "unknown argument '--x'"},
+                                      {{"list", "--root"}, "unknown argument '--root'"}};
+    for (const auto& [arguments, problem] : wrong) {
+        const ProcessResult result = Run(arguments);
+        EXPECT_EQ(result.status, 2);
+        EXPECT_EQ(result.out, "");
+        EXPECT_EQ(result.err, "orvapkg: " + std::string(problem) + " (see orvapkg --help)\n");
     }
     EXPECT_EQ(Run({"--help"}).status, 0);
     EXPECT_EQ(Run({"start", "--help"}).status, 0);

@@ -194,21 +194,42 @@ TEST_F(RunStoreTest, TheRevisionGrowsWithEveryChangeOfTasksOrRuns) {
     EXPECT_EQ(Runs()->Revision(), revision);
 }
 
-TEST_F(RunStoreTest, ARowThatNoVersionCouldHaveWrittenIsCorruption) {
+TEST_F(RunStoreTest, OnlyARunThatWaitsCanBeCancelled) {
+    const std::int64_t waiting = AddRun("state", "'queued'");
+    EXPECT_TRUE(Runs()->Cancel(waiting));
+    EXPECT_EQ(Runs()->Find(waiting)->state, orva::RunState::kSkipped);
+    EXPECT_EQ(Runs()->Find(waiting)->why, "stopped");
+    for (const char* state : {"running", "ended", "skipped", "lost"}) {
+        const std::int64_t run = AddRun("state", "'" + std::string(state) + "'");
+        EXPECT_FALSE(Runs()->Cancel(run));
+        EXPECT_EQ(RunStateText(Runs()->Find(run)->state), state);
+        EXPECT_EQ(Runs()->Find(run)->why, "");
+    }
+    EXPECT_FALSE(Runs()->Cancel(77));
+}
+
+TEST_F(RunStoreTest, ADamagedRowIsLeftOutOfListsAndNamedOnce) {
+    const std::int64_t good = AddRun();
+    TakeLog();
     for (const char* damage : {"task = 0", "task = 3000000000", "reason = 'whim'", "state = ''",
                                "exit_status = 99999999999", "signal = -99999999999"}) {
-        AddRun();
-        Execute("UPDATE run SET " + std::string(damage));
-        TakeLog();
+        const std::int64_t damaged = AddRun("task", "2");
+        Execute("UPDATE run SET " + std::string(damage) + " WHERE id = " + std::to_string(damaged));
+        EXPECT_THAT(Ids(Runs()->List({}, 0, 10).runs), ElementsAre(good)) << damage;
+        EXPECT_EQ(Runs()->List({}, 0, 10).total, 2);
+        EXPECT_THAT(Ids(Runs()->Latest({1, 2})), ElementsAre(good)) << damage;
+        EXPECT_THAT(TakeLog(), ElementsAre(AllOf(
+                                   HasSubstr(DatabasePath() + ": run " + std::to_string(damaged)),
+                                   HasSubstr(": it is left out"))));
         orva::ErrorCode code{};
         try {
-            Runs()->List({}, 0, 10);
+            Runs()->Find(damaged);
         } catch (const orva::StoreFailure& failure) {
             code = failure.Code();
         }
         EXPECT_EQ(code, orva::kErrDatabaseCorrupt) << damage;
-        EXPECT_THAT(TakeLog(), ElementsAre(HasSubstr(DatabasePath() + ": run ")));
-        Execute("DELETE FROM run");
+        TakeLog();
+        Execute("DELETE FROM run WHERE id = " + std::to_string(damaged));
     }
 }
 

@@ -86,6 +86,14 @@ TEST_F(RunWriterTest, OnlyASkippedStartCanStillBeMade) {
     EXPECT_EQ(Runs()->List({}, 0, 0).total, 1);
 }
 
+TEST_F(RunWriterTest, AStartThatWasStoppedWhileItWaitedIsNotMadeAfterAll) {
+    const std::optional<std::int64_t> run = Insert({1, "a", kNoon, RunReason::kSchedule, ""});
+    ASSERT_TRUE(run && Runs()->Cancel(*run));
+    EXPECT_EQ(Insert({1, "a", kNoon, RunReason::kSchedule, ""}), std::nullopt);
+    ASSERT_TRUE(Runs()->Find(*run));
+    EXPECT_EQ(Runs()->Find(*run)->why, "stopped");
+}
+
 TEST_F(RunWriterTest, AStartIsKnownWhenItsRunIsGone) {
     ASSERT_TRUE(Insert({1, "a", kNoon, RunReason::kSchedule, ""}));
     Execute("DELETE FROM run");
@@ -144,7 +152,10 @@ TEST_F(RunWriterTest, WhatWaitsIsReadByIdWithItsDueTime) {
     const std::vector<orva::QueuedRun> all = Queued(0, 10);
     ASSERT_EQ(all.size(), 3U);
     EXPECT_EQ(all[0].due, absl::FromUnixMillis(2500));
+    EXPECT_EQ(all[0].since, absl::FromUnixMillis(2500));
+    EXPECT_EQ(all[0].task, 1);
     EXPECT_EQ(all[1].due, absl::FromUnixSeconds(3));
+    EXPECT_EQ(all[1].since, absl::FromUnixMillis(9000));
     EXPECT_THAT(Queued(1, 1), ElementsAre(Field(&orva::QueuedRun::id, 3)));
     EXPECT_THAT(Queued(4, 1), IsEmpty());
 }
@@ -215,6 +226,48 @@ TEST_F(RunWriterTest, TheNewestInstantIsTheLatestOneNotTheLast) {
     AddRun("queued_at", "9000");
     AddRun("queued_at", "100");
     EXPECT_EQ(newest(), absl::FromUnixMillis(9000));
+}
+
+TEST_F(RunWriterTest, RunsFromBeforeTheClockWasSetDoNotMakeTheNewestInstant) {
+    const auto set = [](std::int64_t millis) {
+        InTransaction([&](orva::Connection& connection) {
+            orva::RecordClockSet(connection, absl::FromUnixMillis(millis));
+            return 0;
+        });
+    };
+    const auto newest = [] {
+        return InTransaction(
+            [](orva::Connection& connection) { return orva::NewestRecord(connection); });
+    };
+    set(50);
+    EXPECT_EQ(newest(), absl::FromUnixMillis(50));
+    AddRun("queued_at", "9000");
+    EXPECT_EQ(newest(), absl::FromUnixMillis(9000));
+    set(100);
+    EXPECT_EQ(newest(), absl::FromUnixMillis(100));
+    AddRun("queued_at", "90");
+    EXPECT_EQ(newest(), absl::FromUnixMillis(100));
+    AddRun("queued_at", "200");
+    AddRun("queued_at", "150");
+    EXPECT_EQ(newest(), absl::FromUnixMillis(200));
+}
+
+TEST_F(RunWriterTest, OnlyWhatWaitsOrGoesOnIsGivenAnEnd) {
+    orva::RunEnding ending;
+    ending.exitStatus = 3;
+    for (const char* state : {"ended", "skipped", "lost"}) {
+        const std::int64_t run = AddRun("state", "'" + std::string(state) + "'");
+        InTransaction([&](orva::Connection& connection) {
+            orva::MarkEnded(connection, run, ending, {"printed", "", 0, 7});
+            orva::MarkLost(connection, run, "gone", absl::FromUnixMillis(5), {"x", "", 0, 1});
+            EXPECT_FALSE(orva::MarkSkipped(connection, run, "overlap"));
+            return 0;
+        });
+        EXPECT_EQ(RunStateText(Runs()->Find(run)->state), state);
+        EXPECT_EQ(Runs()->Find(run)->why, "");
+        EXPECT_FALSE(Runs()->Find(run)->exitStatus);
+        EXPECT_EQ(Runs()->Output(run)->head, "");
+    }
 }
 
 }  // namespace

@@ -27,28 +27,28 @@ Schedule EveryMinute() {
 
 TEST(PassedStartsTest, AStartThatHasJustComeIsTheOnlyOne) {
     const PassedStarts passed = FindPassedStarts(
-        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), Utc("2026-05-01 06:30:00.01"));
+        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), 0, Utc("2026-05-01 06:30:00.01"));
     EXPECT_EQ(passed.latest, UtcSecond("2026-05-01 06:30:00"));
     EXPECT_FALSE(passed.before);
 }
 
 TEST(PassedStartsTest, OfAWeekOfDaysTheLastTwoAreFound) {
     const PassedStarts passed = FindPassedStarts(
-        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), Utc("2026-05-08 05:00:00"));
+        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), 0, Utc("2026-05-08 05:00:00"));
     EXPECT_EQ(passed.latest, UtcSecond("2026-05-07 06:30:00"));
     EXPECT_EQ(passed.before, UtcSecond("2026-05-06 06:30:00"));
 }
 
 TEST(PassedStartsTest, TheStoredStartIsTheOneBeforeWhenOnlyTwoHaveCome) {
     const PassedStarts passed = FindPassedStarts(
-        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), Utc("2026-05-02 06:30:00"));
+        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 06:30:00"), 0, Utc("2026-05-02 06:30:00"));
     EXPECT_EQ(passed.latest, UtcSecond("2026-05-02 06:30:00"));
     EXPECT_EQ(passed.before, UtcSecond("2026-05-01 06:30:00"));
 }
 
 TEST(PassedStartsTest, OfAYearOfMinutesTheLastTwoAreFound) {
     const PassedStarts passed = FindPassedStarts(
-        EveryMinute(), kUtc, UtcSecond("2025-05-01 00:00:00"), Utc("2026-05-01 12:00:59"));
+        EveryMinute(), kUtc, UtcSecond("2025-05-01 00:00:00"), 0, Utc("2026-05-01 12:00:59"));
     EXPECT_EQ(passed.latest, UtcSecond("2026-05-01 12:00:00"));
     EXPECT_EQ(passed.before, UtcSecond("2026-05-01 11:59:00"));
 }
@@ -56,9 +56,24 @@ TEST(PassedStartsTest, OfAYearOfMinutesTheLastTwoAreFound) {
 // Saved again with another schedule after its start had come.
 TEST(PassedStartsTest, AStoredStartThatTheScheduleDoesNotNameCounts) {
     const PassedStarts passed = FindPassedStarts(
-        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 11:17:00"), Utc("2026-05-01 12:00:00"));
+        DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 11:17:00"), 0, Utc("2026-05-01 12:00:00"));
     EXPECT_EQ(passed.latest, UtcSecond("2026-05-01 11:17:00"));
     EXPECT_FALSE(passed.before);
+}
+
+TEST(PassedStartsTest, BesideTheStoredStartOnlyThoseCountThatTheScheduleHoldsFor) {
+    const auto find = [](const std::string& since) {
+        return FindPassedStarts(DailyAt(6, 30), kUtc, UtcSecond("2026-05-01 11:17:00"),
+                                UtcSecond(since), Utc("2026-05-04 12:00:00"));
+    };
+    EXPECT_EQ(find("2026-05-04 06:29:59").latest, UtcSecond("2026-05-04 06:30:00"));
+    EXPECT_EQ(find("2026-05-04 06:29:59").before, UtcSecond("2026-05-01 11:17:00"));
+    EXPECT_EQ(find("2026-05-03 06:00:00").before, UtcSecond("2026-05-03 06:30:00"));
+    EXPECT_EQ(find("2026-05-04 06:30:00").latest, UtcSecond("2026-05-01 11:17:00"));
+    EXPECT_FALSE(find("2026-05-04 06:30:00").before);
+    // By a clock that was put back meanwhile.
+    EXPECT_EQ(find("2027-01-01 00:00:00").latest, UtcSecond("2026-05-01 11:17:00"));
+    EXPECT_EQ(find("2026-04-01 00:00:00").before, UtcSecond("2026-05-03 06:30:00"));
 }
 
 TEST(PassedStartsTest, TheSearchAgreesWithAWalkOverAllStarts) {
@@ -83,7 +98,7 @@ TEST(PassedStartsTest, TheSearchAgreesWithAWalkOverAllStarts) {
             latest = next;
         }
         const PassedStarts passed =
-            FindPassedStarts(schedule, berlin, absl::ToUnixSeconds(first), now);
+            FindPassedStarts(schedule, berlin, absl::ToUnixSeconds(first), 0, now);
         ASSERT_EQ(passed.latest, absl::ToUnixSeconds(latest)) << step;
         ASSERT_EQ(passed.before, before) << step;
     }

@@ -48,8 +48,9 @@ PlannedStart Planned(const std::string& utc, RunReason reason, std::string_view 
     return {UtcSecond(utc), reason, why};
 }
 
-DuePlan Plan(const TaskData& task, const std::string& due, const Moment& moment) {
-    return orva::PlanDueTask(task, UtcSecond(due), moment);
+DuePlan Plan(const TaskData& task, const std::string& due, const Moment& moment,
+             const std::string& since = "1970-01-01 00:00:00") {
+    return orva::PlanDueTask(task, UtcSecond(due), UtcSecond(since), moment);
 }
 
 TEST(PlannerTest, AStartOfThisSecondIsMadeAndTheNextOneFollows) {
@@ -84,6 +85,19 @@ TEST(PlannerTest, TheLatestMissedStartIsMadeUpForWithinADay) {
                 ElementsAre(Planned("2026-04-29 06:30:00", RunReason::kMissed)));
     EXPECT_THAT(Plan(task, "2026-04-22 06:30:00", At("2026-04-30 06:30:01")).starts,
                 ElementsAre(Planned("2026-04-29 06:30:00", RunReason::kSchedule, "missed")));
+}
+
+TEST(PlannerTest, WhatCameBeforeTheTaskWasSavedIsNotMadeUpForBySavingIt) {
+    TaskData task = SampleTask();
+    task.schedule.runMissed = true;
+    const Moment moment = At("2026-05-01 09:00:00");
+    EXPECT_THAT(Plan(task, "2026-05-01 05:00:00", moment, "2026-05-01 08:00:00").starts,
+                ElementsAre(Planned("2026-05-01 05:00:00", RunReason::kSchedule, "missed")));
+    EXPECT_THAT(Plan(task, "2026-05-01 05:00:00", moment, "2026-05-01 06:00:00").starts,
+                ElementsAre(Planned("2026-05-01 06:30:00", RunReason::kMissed)));
+    // Of its own time all the same.
+    EXPECT_THAT(Plan(task, "2026-05-01 08:59:30", moment, "2026-05-01 08:59:40").starts,
+                ElementsAre(Planned("2026-05-01 08:59:30", RunReason::kSchedule)));
 }
 
 TEST(PlannerTest, OfManyMissedStartsTheLatestGoesOnRecord) {
@@ -136,12 +150,12 @@ TEST(PlannerTest, ATaskThatIsOverHasNoNextStart) {
     EXPECT_EQ(plan.next, orva::kNoStart);
 }
 
-TEST(PlannerTest, WhatWaitedWhenTheSchedulerEndedIsStillStartedWithinAnHour) {
+TEST(PlannerTest, WhatWaitsIsStillStartedWithinAnHour) {
     Moment moment = At("2026-05-01 07:30:00");
-    EXPECT_EQ(orva::WhyNotResumed(Utc("2026-05-01 06:30:00"), moment), "");
-    EXPECT_EQ(orva::WhyNotResumed(Utc("2026-05-01 06:29:59"), moment), "missed");
+    EXPECT_EQ(orva::WhyNoLongerStarted(Utc("2026-05-01 06:30:00"), moment), "");
+    EXPECT_EQ(orva::WhyNoLongerStarted(Utc("2026-05-01 06:29:59"), moment), "missed");
     moment.machineStarted = Utc("2026-05-01 06:29:59.5");
-    EXPECT_EQ(orva::WhyNotResumed(Utc("2026-05-01 06:29:59"), moment), "machine off");
+    EXPECT_EQ(orva::WhyNoLongerStarted(Utc("2026-05-01 06:29:59"), moment), "machine off");
 }
 
 TEST(RunningTasksTest, ATaskRunsTwiceAtOnceOnlyWhereThatIsAllowed) {

@@ -182,6 +182,49 @@ TEST_F(SchedulerClocksTest, AClockThatStandsADayBeforeTheHistoryStartsNothing) {
                                        "b 04-28 12:30 schedule skipped clock not trusted"));
 }
 
+TEST_F(SchedulerClocksTest, AClockThatWasSetIsStillTrustedAfterARestart) {
+    AddTask("a", 12, 30);
+    SetNow("2027-05-01 12:30:00");
+    Work();
+    End(host.started.back().run);
+    Work();
+    SetNow("2026-05-01 12:00:00");
+    RestartAndRecover();
+    EXPECT_EQ(Work(), Utc("2027-05-02 12:30:00"));
+    scheduler->ClockWasSet();
+    Work();
+    RestartAndRecover();
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    EXPECT_EQ(host.started.size(), 2U);
+    End(host.started.back().run);
+    Work();
+    // Not so that one is trusted which stands a day before what it was set to.
+    SetNow("2026-04-29 12:00:00");
+    RestartAndRecover();
+    SetNow("2026-04-29 12:30:00");
+    Execute("UPDATE task SET next_start = 1777465800");
+    Work();
+    EXPECT_EQ(host.started.size(), 2U);
+}
+
+TEST_F(SchedulerClocksTest, AClockThatWasSetToANonsensicalTimeIsNotRemembered) {
+    options.programMade = Utc("2026-04-01 00:00:00");
+    AddTask("a", 12, 30);
+    SetNow("2026-05-01 12:30:00");
+    RestartAndRecover();
+    Work();
+    SetNow("2000-01-01 00:00:00");
+    scheduler->ClockWasSet();
+    Work();
+    SetNow("2026-04-20 12:00:00");
+    RestartAndRecover();
+    AddTask("b", 12, 30, kTogether);
+    SetNow("2026-04-20 12:30:00");
+    Work();
+    EXPECT_EQ(host.started.size(), 1U);
+}
+
 TEST_F(SchedulerClocksTest, AChangedTimeZoneMovesTheStartsToItsOwnTimes) {
     const int id = AddTask("a", 18, 0);
     Work();

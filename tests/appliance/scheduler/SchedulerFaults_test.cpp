@@ -115,6 +115,37 @@ TEST_F(SchedulerFaultsTest, ARunThatIsGoneWithoutAnEndingIsLost) {
     EXPECT_THAT(Started(), ElementsAre("a"));
 }
 
+TEST_F(SchedulerFaultsTest, AnEndingThatCannotBeReadForNowIsReadLater) {
+    options.mostRuns = 100;
+    RestartAndRecover();
+    for (int count = 0; count < 40; ++count) {
+        AddTask("a", 12, 30, kTogether);
+    }
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    for (std::int64_t run = 1; run <= 40; ++run) {
+        End(run, 3);
+    }
+    host.outputs[7] = {"printed", "", 0, 7};
+    host.unreadable = true;
+    TakeLog();
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00") + absl::Milliseconds(500));
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00") + absl::Milliseconds(500));
+    const std::vector<std::string> log = TakeLog();
+    ASSERT_EQ(log.size(), 40U);
+    EXPECT_EQ(log[0], "the ending of run 1 cannot be read for now: Too many open files");
+    EXPECT_EQ(Find(1)->state, orva::RunState::kRunning);
+    EXPECT_EQ(scheduler->Stop(1), "it is not running");
+    EXPECT_EQ(host.folders.size(), 40U);
+
+    host.unreadable = false;
+    EXPECT_EQ(Work(), Utc("2026-05-02 12:30:00"));
+    EXPECT_EQ(orva::RunStore::Current()->List({{}, orva::RunState::kEnded}, 0, 0).total, 40);
+    EXPECT_EQ(Find(1)->exitStatus, 3);
+    EXPECT_EQ(orva::RunStore::Current()->Output(7)->head, "printed");
+    EXPECT_THAT(host.folders, IsEmpty());
+}
+
 TEST_F(SchedulerFaultsTest, ARunOfAnEarlierBootIsLostUnlessItHadEnded) {
     AddTask("a", 12, 30, kTogether);
     AddTask("b", 12, 30, kTogether);

@@ -3,42 +3,64 @@
 #include <SQLiteCpp/SQLiteCpp.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <chrono>
 
 #include "tests/appliance/scheduler/Instants.h"
 
-std::optional<std::string> FakeHost::Start(const orva::RunOrder& order) {
+std::optional<std::string> FakeHost::Prepare(const orva::RunOrder& order) {
+    if (onPrepare) {
+        onPrepare();
+    }
+    if (!noRoom.empty()) {
+        return noRoom;
+    }
+    folders.insert(order.run);
+    prepared[order.run] = order;
+    return std::nullopt;
+}
+
+std::optional<std::string> FakeHost::Start(std::int64_t run) {
     if (beforeStart) {
         beforeStart();
     }
     if (!refusal.empty()) {
         return refusal;
     }
-    started.push_back(order);
-    folders.insert(order.run);
-    goingOn.insert(order.run);
+    started.push_back(prepared.at(run));
+    prepared.erase(run);
+    goingOn.insert(run);
     return std::nullopt;
 }
 
 orva::RunHost::Trace FakeHost::Look(std::int64_t run) {
-    if (goingOn.count(run) != 0) {
-        return Trace::kGoesOn;
+    const Trace trace = goingOn.count(run) != 0    ? Trace::kGoesOn
+                        : prepared.count(run) != 0 ? Trace::kNotBegun
+                                                   : Trace::kOver;
+    if (onLook) {
+        onLook(run);
     }
-    return folders.count(run) != 0 ? Trace::kOver : Trace::kNotBegun;
+    return trace;
 }
 
-std::optional<orva::RunEnding> FakeHost::Ending(std::int64_t run) const {
-    const auto ending = endings.find(run);
-    return ending == endings.end() ? std::nullopt : std::optional(ending->second);
-}
-
-orva::StoredOutput FakeHost::Output(std::int64_t run) const {
-    const auto output = outputs.find(run);
-    return output == outputs.end() ? orva::StoredOutput() : output->second;
+std::optional<orva::RunRemains> FakeHost::Remains(std::int64_t run) const {
+    if (unreadable) {
+        errno = EMFILE;
+        return std::nullopt;
+    }
+    orva::RunRemains remains;
+    if (const auto ending = endings.find(run); ending != endings.end()) {
+        remains.ending = ending->second;
+    }
+    if (const auto output = outputs.find(run); output != outputs.end()) {
+        remains.output = output->second;
+    }
+    return remains;
 }
 
 void FakeHost::Remove(std::int64_t run) {
     folders.erase(run);
+    prepared.erase(run);
     goingOn.erase(run);
 }
 
@@ -46,7 +68,7 @@ std::vector<std::int64_t> FakeHost::All() const { return {folders.begin(), folde
 
 SchedulerTest::SchedulerTest() {
     options.mostRuns = 64;
-    Restart();
+    RestartAndRecover();
 }
 
 void SchedulerTest::Restart() {

@@ -16,10 +16,10 @@
 class FakeHost : public orva::RunHost {
   public:
     const std::string& BootId() const override { return bootId; }
-    std::optional<std::string> Start(const orva::RunOrder& order) override;
+    std::optional<std::string> Prepare(const orva::RunOrder& order) override;
+    std::optional<std::string> Start(std::int64_t run) override;
     Trace Look(std::int64_t run) override;
-    std::optional<orva::RunEnding> Ending(std::int64_t run) const override;
-    orva::StoredOutput Output(std::int64_t run) const override;
+    std::optional<orva::RunRemains> Remains(std::int64_t run) const override;
     void Remove(std::int64_t run) override;
     std::vector<std::int64_t> All() const override;
     void Stop(std::int64_t run) override { stopped.push_back(run); }
@@ -28,13 +28,21 @@ class FakeHost : public orva::RunHost {
     // In order, of all schedulers.
     std::vector<orva::RunOrder> started;
     std::vector<std::int64_t> stopped;
-    // Why no run can be started; empty when runs can.
+    // Why no run can be prepared, or started; empty when runs can.
+    std::string noRoom;
     std::string refusal;
-    // Runs that have a folder.
+    // Runs that have a folder; those of them that have not begun, with their orders.
     std::set<std::int64_t> folders;
+    std::map<std::int64_t, orva::RunOrder> prepared;
     std::set<std::int64_t> goingOn;
+    // Called when a run is prepared.
+    std::function<void()> onPrepare;
     // Called before a run is started: to fail there, as at a kill.
     std::function<void()> beforeStart;
+    // Called when somebody asks what has become of a run. The answer is from before the call.
+    std::function<void(std::int64_t)> onLook;
+    // Nothing that runs have left can be read.
+    bool unreadable = false;
     std::map<std::int64_t, orva::RunEnding> endings;
     std::map<std::int64_t, orva::StoredOutput> outputs;
 };

@@ -226,6 +226,163 @@ TEST_F(SchedulerTest, OnlyRunsThatGoOnCanBeStopped) {
     EXPECT_THAT(host.stopped, ElementsAre(1));
 }
 
+TEST_F(SchedulerTest, ARunThatIsStoppedWhileItWaitsIsNotStarted) {
+    options.mostRuns = 1;
+    RestartAndRecover();
+    AddTask("a", 12, 30, kTogether);
+    AddTask("b", 12, 30, kTogether);
+    AddTask("c", 12, 30, kTogether);
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    EXPECT_EQ(scheduler->Stop(2), std::nullopt);
+    EXPECT_EQ(scheduler->Stop(2), "it is not running");
+    EXPECT_THAT(host.stopped, IsEmpty());
+    End(1);
+    Work();
+    EXPECT_THAT(Started(), ElementsAre("a", "c"));
+    EXPECT_THAT(History(), ElementsAre("a 05-01 12:30 schedule ended -",
+                                       "b 05-01 12:30 schedule skipped stopped",
+                                       "c 05-01 12:30 schedule running -"));
+}
+
+TEST_F(SchedulerTest, ATaskThatWaitsAlreadyIsNotQueuedAgain) {
+    options.mostRuns = 1;
+    RestartAndRecover();
+    AddTask("long", 12, 0, kTogether);
+    orva::TaskData task = SampleTask("often");
+    task.flags |= orva::kCanRunAppSameTime;
+    task.schedule.firstMinute = 0;
+    task.schedule.intervalMinutes = 1;
+    AddTask(task);
+    task.name = "often and together";
+    task.flags |= kTogether;
+    AddTask(task);
+    Execute("UPDATE task SET next_start = 1777636800 WHERE id = 1");
+    Work();
+    for (const char* now : {"2026-05-01 12:01:00", "2026-05-01 12:02:00"}) {
+        SetNow(now);
+        Work();
+    }
+    EXPECT_THAT(History(), ElementsAre("long 05-01 12:00 schedule running -",
+                                       "often 05-01 12:01 schedule queued -",
+                                       "often and together 05-01 12:01 schedule queued -",
+                                       "often 05-01 12:02 schedule skipped overlap",
+                                       "often and together 05-01 12:02 schedule queued -"));
+    // By somebody who does not ask the scheduler.
+    EXPECT_TRUE(orva::RunStore::Current()->Cancel(2));
+    SetNow("2026-05-01 12:03:00");
+    Work();
+    EXPECT_EQ(Find(6)->state, orva::RunState::kQueued);
+}
+
+TEST_F(SchedulerTest, WhatHasWaitedForAnHourIsNotStartedAnyMore) {
+    options.mostRuns = 1;
+    RestartAndRecover();
+    AddTask("long", 12, 10, kTogether);
+    AddTask("waits", 12, 10, kTogether);
+    AddTask("later", 13, 0, kTogether);
+    SetNow("2026-05-01 12:10:00");
+    Work();
+    EXPECT_EQ(Find(2)->state, orva::RunState::kQueued);
+    SetNow("2026-05-01 13:10:00");
+    EXPECT_EQ(Work(), Utc("2026-05-01 13:10:01"));
+    EXPECT_EQ(Find(2)->state, orva::RunState::kQueued);
+    SetNow("2026-05-01 13:10:01");
+    Work();
+    EXPECT_THAT(History(), ElementsAre("long 05-01 12:10 schedule running -",
+                                       "waits 05-01 12:10 schedule skipped missed",
+                                       "later 05-01 13:00 schedule skipped missed"));
+    End(1);
+    Work();
+    EXPECT_THAT(Started(), ElementsAre("long"));
+}
+
+TEST_F(SchedulerTest, AStartThatIsMadeUpForWaitsAsLongAsOthers) {
+    options.mostRuns = 1;
+    RestartAndRecover();
+    orva::TaskData task = SampleTask("a");
+    task.flags |= kTogether;
+    task.schedule.runMissed = true;
+    AddTask(task);
+    AddTask(task);
+    SetNow("2026-05-02 09:00:00");
+    Work();
+    SetNow("2026-05-02 09:30:00");
+    RestartAndRecover();
+    Work();
+    End(1);
+    Work();
+    EXPECT_THAT(History(),
+                ElementsAre("a 05-02 06:30 missed ended -", "a 05-02 06:30 missed running -"));
+}
+
+TEST_F(SchedulerTest, ASavedTaskIsNotStartedForATimeBeforeThat) {
+    orva::TaskData task = SampleTask("a");
+    task.schedule.runMissed = true;
+    const int id = AddTask(task);
+    // Two days without a scheduler.
+    SetNow("2026-05-03 15:40:10");
+    const orva::TaskData stored = Stored(id);
+    orva::TaskData changed = stored;
+    changed.schedule.firstMinute = 15 * 60 + 40;
+    orva::TaskStore::Current()->Change(stored, changed);
+    SetNow("2026-05-03 15:40:20");
+    RestartAndRecover();
+    EXPECT_EQ(Work(), Utc("2026-05-04 15:40:00"));
+    EXPECT_THAT(History(), ElementsAre("a 05-02 06:30 schedule skipped missed"));
+}
+
+TEST_F(SchedulerTest, ATaskThatIsEnabledIsNotStartedForATimeBeforeThat) {
+    orva::TaskData task = SampleTask("a");
+    task.schedule.runMissed = true;
+    const int id = AddTask(task);
+    const auto enable = [&](bool on) {
+        const orva::TaskData stored = Stored(id);
+        orva::TaskData changed = stored;
+        changed.Set(orva::kEnabled, on);
+        orva::TaskStore::Current()->Change(stored, changed);
+    };
+    SetNow("2026-05-02 12:00:00");
+    enable(false);
+    SetNow("2026-05-03 12:00:00");
+    enable(true);
+    RestartAndRecover();
+    EXPECT_EQ(Work(), Utc("2026-05-04 06:30:00"));
+    EXPECT_THAT(History(), ElementsAre("a 05-02 06:30 schedule skipped missed"));
+}
+
+TEST_F(SchedulerTest, ASaveThatLeavesTheScheduleAsItIsLeavesWhatWasMissed) {
+    orva::TaskData task = SampleTask("a");
+    task.schedule.mode = orva::Schedule::Mode::kDate;
+    task.schedule.date = absl::CivilDay(2026, 5, 2);
+    task.schedule.repeat = orva::Schedule::Repeat::kDaily;
+    task.schedule.runMissed = true;
+    const int id = AddTask(task);
+    SetNow("2026-05-03 15:40:10");
+    const orva::TaskData stored = Stored(id);
+    orva::TaskData changed = stored;
+    changed.name = "b";
+    changed.Set(orva::kCanRunTaskSameTime, true);
+    orva::TaskStore::Current()->Change(stored, changed);
+    RestartAndRecover();
+    Work();
+    EXPECT_THAT(History(), ElementsAre("b 05-03 06:30 missed running -"));
+}
+
+TEST_F(SchedulerTest, ADamagedRowThatWaitsEndsWithTheReason) {
+    const int id = AddTask("a", 12, 30, kTogether);
+    Execute(
+        "INSERT INTO run (task, task_name, reason, state, queued_at, asked_program, "
+        "asked_account) VALUES (" +
+        std::to_string(id) + ", 'a', 'whim', 'queued', 1777636800000, '', ''), " +
+        "(99, 'gone', 'hand', 'queued', 1777636800000, '', '')");
+    Work();
+    EXPECT_THAT(Started(), IsEmpty());
+    Execute("UPDATE run SET reason = 'hand'");
+    EXPECT_THAT(History(),
+                ElementsAre("a - hand ended its row is damaged", "gone - hand skipped deleted"));
+}
+
 TEST_F(SchedulerTest, AHundredRunsOfATaskAreKeptAndOfOthersAll) {
     const int busy = AddTask("busy", 12, 30, kTogether);
     const int other = AddTask("other", 18, 0, kTogether);

@@ -1,15 +1,22 @@
 #include "appliance/supervisor/RunFolder.h"
 
 #include <fcntl.h>
+#include <linux/filter.h>
+#include <linux/seccomp.h>
 #include <poll.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstddef>
 #include <filesystem>
+#include <iterator>
+#include <utility>
 
 #include "tests/appliance/util/Sandbox.h"
 
@@ -168,7 +175,8 @@ TEST_F(RunFolderTest, SignalsTheCommandsGroupOnlyWhileItRuns) {
 TEST_F(RunFolderTest, TellsHowFarItsRunHasCome) {
     using State = orva::RunFolder::State;
     const orva::RunFolder folder(7);
-    EXPECT_EQ(folder.Look(), State::kNotBegun);
+    // Nor does anybody know what became of it.
+    EXPECT_EQ(folder.Look(), State::kAbandoned);
     orva::FileDescriptor lock = Create(folder);
     EXPECT_EQ(folder.Look(), State::kSupervised);
     lock = orva::FileDescriptor();
@@ -177,6 +185,9 @@ TEST_F(RunFolderTest, TellsHowFarItsRunHasCome) {
     EXPECT_EQ(folder.Look(), State::kAbandoned);
     Write("/usr/orva/var/runs/7/ending", "ended=1\0why=\0end=\0"s);
     EXPECT_EQ(folder.Look(), State::kEnded);
+    std::filesystem::remove(folder.Path() + "/ending");
+    std::filesystem::remove(folder.Path() + "/process");
+    EXPECT_EQ(folder.Look(), State::kAbandoned);
 }
 
 TEST_F(RunFolderTest, WithoutAFileDescriptorNobodyKnowsHowFarItsRunHasCome) {
@@ -210,48 +221,123 @@ TEST_F(RunFolderTest, HoldsTheTimeAtWhichAStoppedCommandIsKilled) {
     EXPECT_EQ(Read("/usr/orva/var/runs/7/process"), "killAt=123456789\0"s);
 }
 
-TEST_F(RunFolderTest, KillsAnAbandonedCommandOnlyWhenItIsCertainlyTheSame) {
-    const orva::RunFolder folder(7);
-    orva::FileDescriptor lock = Create(folder);
-    int ready[2];
-    ASSERT_EQ(::pipe2(ready, O_CLOEXEC), 0);
-    const pid_t child = ::fork();
-    if (child == 0) {
-        lock = orva::FileDescriptor();
-        ::setpgid(0, 0);
-        static_cast<void>(::write(ready[1], "r", 1));
-        ::pause();
-        ::_exit(0);
+// A command in a process group of its own that answers each byte it is sent.
+class Answering {
+  public:
+    Answering() {
+        EXPECT_EQ(::pipe2(toCommand, O_CLOEXEC), 0);
+        EXPECT_EQ(::pipe2(fromCommand, O_CLOEXEC), 0);
+        pid = ::fork();
+        if (pid == 0) {
+            ::setpgid(0, 0);
+            ::dup2(toCommand[0], STDIN_FILENO);
+            ::dup2(fromCommand[1], STDOUT_FILENO);
+            // The lock of the run's folder, too.
+            ::close_range(STDERR_FILENO + 1, ~0U, 0);
+            char byte = 0;
+            while (::read(STDIN_FILENO, &byte, 1) == 1 && ::write(STDOUT_FILENO, &byte, 1) == 1) {
+            }
+            ::_exit(0);
+        }
+        ::close(std::exchange(toCommand[0], -1));
+        ::close(std::exchange(fromCommand[1], -1));
+        EXPECT_TRUE(Answers());
     }
-    char byte = 0;
-    ASSERT_EQ(::read(ready[0], &byte, 1), 1);
-    ::close(ready[0]);
-    ::close(ready[1]);
-    const std::uint64_t start = orva::ProcessStart(child).value_or(0);
-    const auto record = [&](const std::string& bootId, std::uint64_t commandStart) {
-        Write("/usr/orva/var/runs/7/process", orva::SupervisorRecords({bootId, 17, 4711, 0}) +
-                                                  orva::CommandRecords(child, commandStart));
-    };
-    record(orva::BootId(), start);
+    ~Answering() {
+        ::close(toCommand[1]);
+        ::close(fromCommand[0]);
+        ::waitpid(pid, nullptr, 0);
+    }
+    Answering(const Answering&) = delete;
+    Answering& operator=(const Answering&) = delete;
+
+    pid_t Pid() const { return pid; }
+    // False when it has been killed: it does not get as far as an answer then.
+    bool Answers() const {
+        char byte = 'x';
+        return ::write(toCommand[1], &byte, 1) == 1 && ::read(fromCommand[0], &byte, 1) == 1;
+    }
+
+  private:
+    int toCommand[2] = {-1, -1};
+    int fromCommand[2] = {-1, -1};
+    pid_t pid = -1;
+};
+
+class AbandonedCommandTest : public RunFolderTest {
+  protected:
+    AbandonedCommandTest() : lock(Create(folder)) { ::signal(SIGPIPE, SIG_IGN); }
+
+    void Record(const std::string& bootId, std::uint64_t commandStart) const {
+        Write("/usr/orva/var/runs/7/process",
+              orva::SupervisorRecords({bootId, 17, 4711, 0}) +
+                  orva::CommandRecords(command.Pid(), commandStart));
+    }
+    // How the command ended; 0 when it was not killed.
+    int SignalThatEndedIt() const {
+        siginfo_t info{};
+        return ::waitid(P_PID, static_cast<id_t>(command.Pid()), &info, WEXITED | WNOWAIT) == 0 &&
+                       info.si_code == CLD_KILLED
+                   ? info.si_status
+                   : 0;
+    }
+
+    const orva::RunFolder folder{7};
+    orva::FileDescriptor lock;
+    const Answering command;
+    const std::uint64_t start = orva::ProcessStart(command.Pid()).value_or(0);
+};
+
+TEST_F(AbandonedCommandTest, IsKilledOnlyWhenItIsCertainlyTheSame) {
+    Record(orva::BootId(), start);
     EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
     lock = orva::FileDescriptor();
-    record(orva::BootId(), start - 1);
+    Record(orva::BootId(), start - 1);
     EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
-    record(orva::BootId(), 0);
+    Record(orva::BootId(), 0);
     EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
-    record("00000000-0000-0000-0000-000000000000", start);
+    Record("00000000-0000-0000-0000-000000000000", start);
     EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
-    EXPECT_EQ(::waitpid(child, nullptr, WNOHANG), 0);
+    EXPECT_TRUE(command.Answers());
 
-    record(orva::BootId(), start);
+    Record(orva::BootId(), start);
     const orva::FileDescriptor shell = folder.KillAbandonedCommand();
     ASSERT_TRUE(shell.IsOpen());
     pollfd ended{shell.Get(), POLLIN, 0};
     EXPECT_EQ(::poll(&ended, 1, 60'000), 1);
+    ASSERT_FALSE(command.Answers());
+    EXPECT_EQ(SignalThatEndedIt(), SIGKILL);
+}
+
+// From now on this process's kernel knows no signals to groups by a process descriptor, as before
+// Linux 6.9.
+bool ForgetGroupSignals() {
+    constexpr unsigned kFlags = offsetof(seccomp_data, args) + 3 * sizeof(std::uint64_t);
+    sock_filter filter[] = {
+        BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+        BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, SYS_pidfd_send_signal, 0, 3),
+        BPF_STMT(BPF_LD | BPF_W | BPF_ABS, kFlags),
+        BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, 0, 1, 0),
+        BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | EINVAL),
+        BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW),
+    };
+    const sock_fprog program{static_cast<unsigned short>(std::size(filter)), filter};
+    return ::prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 &&
+           ::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &program) == 0;
+}
+
+TEST_F(AbandonedCommandTest, IsKilledOnKernelsWithoutSignalsToGroupsByDescriptor) {
+    lock = orva::FileDescriptor();
+    Record(orva::BootId(), start);
+    const pid_t scheduler = ::fork();
+    if (scheduler == 0) {
+        ::_exit(ForgetGroupSignals() && folder.KillAbandonedCommand().IsOpen() ? 0 : 1);
+    }
     int status = 0;
-    ASSERT_EQ(::waitpid(child, &status, 0), child);
-    EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL);
-    EXPECT_FALSE(folder.KillAbandonedCommand().IsOpen());
+    ASSERT_EQ(::waitpid(scheduler, &status, 0), scheduler);
+    EXPECT_EQ(status, 0);
+    ASSERT_FALSE(command.Answers());
+    EXPECT_EQ(SignalThatEndedIt(), SIGKILL);
 }
 
 TEST_F(RunFolderTest, ReplacesWhatStandsThereAlready) {

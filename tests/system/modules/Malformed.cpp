@@ -46,6 +46,8 @@ const ORVA::APITableRow* GetAPITable() {
     static const ORVA::APITableRow row = {"Test.Malformed", 0, "bad", &Method};
 #elif defined(ORVA_FAULT_REPEATED)
     static const ORVA::APITableRow row = kGoodRow;
+#elif defined(ORVA_FAULT_INTRUDING)
+    static const ORVA::APITableRow row = {"Test.Echo", 1, "more", &Method};
 #elif defined(ORVA_FAULT_TAKEN)
     static const ORVA::APITableRow row = {"Test.Echo", 1, "echo", &Method};
 #endif
