@@ -5,22 +5,11 @@
 #include <optional>
 #include <utility>
 
+#include "appliance/util/Text.h"
 #include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {
-
-bool IsBlank(char byte) { return byte == ' ' || byte == '\t'; }
-
-std::string_view Trim(std::string_view text) {
-    while (!text.empty() && IsBlank(text.front())) {
-        text.remove_prefix(1);
-    }
-    while (!text.empty() && IsBlank(text.back())) {
-        text.remove_suffix(1);
-    }
-    return text;
-}
 
 bool IsKey(std::string_view text) {
     return !text.empty() && std::all_of(text.begin(), text.end(), [](char byte) {
@@ -60,10 +49,10 @@ std::optional<std::pair<std::string, std::string>> ParseLine(std::string_view li
     if (equals == std::string_view::npos || ValidUtf8Length(line) != line.size()) {
         return std::nullopt;
     }
-    const std::string_view key = Trim(line.substr(0, equals));
-    std::string_view rest = Trim(line.substr(equals + 1));
+    const std::string_view key = TrimBlanks(line.substr(0, equals));
+    std::string_view rest = TrimBlanks(line.substr(equals + 1));
     std::optional<std::string> value = TakeQuoted(rest);
-    rest = Trim(rest);
+    rest = TrimBlanks(rest);
     if (!IsKey(key) || !value || (!rest.empty() && rest.front() != '#')) {
         return std::nullopt;
     }
@@ -85,7 +74,7 @@ ConfFile ParseConf(std::string_view content) {
         if (!line.empty() && line.back() == '\r') {
             line.remove_suffix(1);
         }
-        line = Trim(line);
+        line = TrimBlanks(line);
         if (line.empty() || line.front() == '#') {
             continue;
         }

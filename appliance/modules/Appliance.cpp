@@ -18,6 +18,7 @@
 #include "appliance/store/SchedulerLink.h"
 #include "appliance/store/TaskStore.h"
 #include "appliance/tools/Buzzer.h"
+#include "appliance/webapi/Language.h"
 #include "platform/texts.h"
 #include "platform/webapi.h"
 
@@ -26,7 +27,6 @@ namespace {
 using orva::Parameters;
 
 constexpr const char* kApiName = "ORVA.Core.Appliance";
-constexpr const char* kTextsDirectory = "/usr/orva/orvaman/webman/texts/";
 
 Json::Value Shares(const Parameters& /*parameters*/) {
     const std::optional<std::vector<orva::Share>> shares = orva::ShareRegistry().List();
@@ -57,8 +57,8 @@ Json::Value Owners(const Parameters& /*parameters*/) {
 Json::Value Texts(const Parameters& parameters) {
     Json::Value answer(Json::objectValue);
     answer["language"] = parameters.Language();
-    answer["texts"] =
-        ORVA::ZUM::LocalizedStringParser().ParseTexts(kTextsDirectory + parameters.Language());
+    answer["texts"] = *ORVA::ZUM::LocalizedStringParser().ParseTexts(orva::kTextsDirectory +
+                                                                     parameters.Language());
     return answer;
 }
 
@@ -82,6 +82,7 @@ Json::Value Info(const Parameters& /*parameters*/) {
 Json::Value Revision(const Parameters& /*parameters*/) {
     Json::Value answer(Json::objectValue);
     answer["revision"] = Json::Int64{orva::RunStore::Current()->Revision()};
+    answer["scheduler"] = orva::SchedulerLink::IsAlive();
     return answer;
 }
 

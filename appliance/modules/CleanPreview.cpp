@@ -34,16 +34,13 @@ constexpr std::int64_t kMostBytes = std::numeric_limits<std::int64_t>::max();
 constexpr int kDone = 0;
 constexpr int kDoneInPart = 1;
 
-bool IsExtension(const std::string& text) {
-    const auto allowed = [](char character) {
-        const bool letter =
-            (character >= 'a' && character <= 'z') || (character >= 'A' && character <= 'Z');
-        return letter || (character >= '0' && character <= '9') ||
-               std::strchr("_+-", character) != nullptr ||
-               static_cast<unsigned char>(character) >= 0x80;
-    };
-    return !text.empty() && text.size() <= kLongestExtension &&
-           std::all_of(text.begin(), text.end(), allowed);
+// A task hands its extensions over in a shell's double quotes: with these the command would say
+// something else.
+bool BreaksCommand(const std::string& extension) {
+    return std::any_of(extension.begin(), extension.end(), [](char character) {
+        const auto byte = static_cast<unsigned char>(character);
+        return byte < 0x20 || byte == 0x7f || std::strchr("\"$`\\", character) != nullptr;
+    });
 }
 
 void AddNumber(std::vector<std::string>& arguments, const char* option,
@@ -65,17 +62,27 @@ void AddOrder(std::vector<std::string>& arguments, const Parameters& parameters)
 }
 
 void AddExtensions(std::vector<std::string>& arguments, const Parameters& parameters) {
+    const std::vector<std::string> extensions = parameters.Texts("extensions", kMostExtensions);
     std::string list;
-    for (const std::string& extension : parameters.Texts("extensions", kMostExtensions)) {
-        if (!IsExtension(extension)) {
-            RefuseParameter("extensions",
-                            "holds something that is no extension of letters, digits, _ + and -");
+    for (const std::string& extension : extensions) {
+        if (extension.size() > kLongestExtension) {
+            RefuseParameter("extensions", "holds a text of more than " +
+                                              std::to_string(kLongestExtension) + " bytes");
         }
-        list += (list.empty() ? "" : ".") + extension;
+        if (BreaksCommand(extension)) {
+            RefuseParameter("extensions",
+                            "holds a quote, $, `, \\ or a control character, which the command of "
+                            "a task cannot carry");
+        }
+        list += extension + ".";
     }
-    if (!list.empty()) {
-        arguments.push_back("-file_ext=" + list);
+    if (extensions.empty()) {
+        return;
     }
+    if (list.find_first_not_of(". ") == std::string::npos) {
+        RefuseParameter("extensions", "names no extension");
+    }
+    arguments.push_back("-file_ext=" + list);
 }
 
 std::vector<std::string> CleanerArguments(const Parameters& parameters) {

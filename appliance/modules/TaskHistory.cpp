@@ -140,8 +140,14 @@ Json::Value Next(const Parameters& parameters) {
 
 Json::Value Stop(const Parameters& parameters) {
     const std::int64_t run = parameters.RequiredInteger("run", 1, kHighestRun);
-    if (!RunStore::Current()->Find(run)) {
+    const std::shared_ptr<RunStore> store = RunStore::Current();
+    const std::optional<Run> found = store->Find(run);
+    if (!found) {
         RefuseRun(run);
+    }
+    // One that waits needs no scheduler for it. It may be started just now.
+    if (found->state == orva::RunState::kQueued && store->Cancel(run)) {
+        return Json::Value(Json::objectValue);
     }
     if (const std::optional<std::string> reason = orva::SchedulerLink::Stop(run)) {
         throw ApiFailure(ModuleError::kCannotStop, *reason);

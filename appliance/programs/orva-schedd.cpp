@@ -9,6 +9,7 @@
 #include <filesystem>
 #include <string>
 
+#include "appliance/programs/UsageError.h"
 #include "appliance/root/Root.h"
 #include "appliance/scheduler/Daemon.h"
 #include "appliance/scheduler/PrivateView.h"
@@ -19,7 +20,6 @@ namespace {
 
 // Another scheduler runs for this root, or what it needs around it cannot be made.
 constexpr int kRefused = 3;
-constexpr int kUsage = 2;
 constexpr const char* kSupervisor = "orva-run";
 // The loop stands still while it waits for another process that holds the database.
 constexpr std::chrono::milliseconds kBusyTimeout{2000};
@@ -88,7 +88,7 @@ int main(int argc, char** argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? EXIT_SUCCESS : kUsage;
+        return orva::EndOfCommandLine("orva-schedd", app, error);
     }
 
     ::openlog("orva-schedd", LOG_PID | LOG_PERROR, LOG_DAEMON);

@@ -8,6 +8,7 @@
 #include <iterator>
 #include <string>
 
+#include "appliance/programs/UsageError.h"
 #include "appliance/root/Root.h"
 #include "appliance/util/StrictJson.h"
 #include "appliance/webapi/Dispatcher.h"
@@ -16,9 +17,7 @@
 
 namespace {
 
-constexpr char kModulesDirectory[] = "/usr/orva/lib";
-
-enum ExitStatus : int { kSuccess = 0, kApiError = 1, kWrongUsage = 2 };
+enum ExitStatus : int { kSuccess = 0, kFailure = 1, kWrongUsage = 2 };
 
 struct Arguments {
     std::string root;
@@ -30,9 +29,9 @@ struct Arguments {
     std::string document = "{}";
 };
 
-int WrongUsage(const std::string& message) {
+ExitStatus Complain(ExitStatus status, const std::string& message) {
     std::cerr << "orva-webapi: " << message << '\n';
-    return kWrongUsage;
+    return status;
 }
 
 std::string ReadStandardInput() {
@@ -49,20 +48,22 @@ int Run(const Arguments& arguments) {
     std::string error;
     const std::optional<Json::Value> parameters = orva::ParseStrictJson(document, error);
     if (!parameters || !parameters->isObject()) {
-        return WrongUsage("the parameters are no JSON object" +
-                          (error.empty() ? std::string() : ": " + error));
+        return Complain(kWrongUsage, "the parameters are no JSON object" +
+                                         (error.empty() ? std::string() : ": " + error));
     }
     const orva::ModuleLoader modules(
-        arguments.modules.empty() ? orva::ResolvePath(kModulesDirectory) : arguments.modules);
+        arguments.modules.empty() ? orva::ResolvePath(orva::kModulesDirectory) : arguments.modules);
     const orva::Dispatcher dispatcher(modules.Catalogue());
     const orva::ApiAnswer answer =
         dispatcher.Call(arguments.api, arguments.version, arguments.method, document,
                         orva::ChooseLanguage(arguments.language, {}));
+    const bool success = answer.response.IsSuccess();
     std::cout << orva::WriteAnswer(answer.response) << std::endl;
     if (!std::cout) {
-        return WrongUsage("the answer could not be written");
+        return Complain(kFailure, "the answer could not be written; the call itself " +
+                                      std::string(success ? "was carried out" : "failed"));
     }
-    return answer.response.IsSuccess() ? kSuccess : kApiError;
+    return success ? kSuccess : kFailure;
 }
 
 }  // namespace
@@ -71,14 +72,15 @@ int main(int argc, char** argv) {
     Arguments arguments;
     CLI::App app(
         "Calls one method of the appliance's web API and prints its answer.\n"
-        "Exit status: 0 success, 1 the API answered an error, 2 wrong usage.");
+        "Exit status: 0 success, 1 the API answered an error or the answer could not be "
+        "written, 2 wrong usage.");
     app.add_option("--root", arguments.root,
                    "Directory below which the appliance lives (default: ORVA_ROOT, or /)");
     app.add_option("--lang", arguments.language, "Language of the texts in the answer")
         ->capture_default_str();
     app.add_option("--modules", arguments.modules,
-                   std::string("Directory of the API modules (default: ") + kModulesDirectory +
-                       " below the root)");
+                   std::string("Directory of the API modules (default: ") +
+                       orva::kModulesDirectory + " below the root)");
     app.add_option("API", arguments.api, "The API, such as ORVA.Core.TaskScheduler")->required();
     app.add_option("VERSION", arguments.version, "Its version")->required();
     app.add_option("METHOD", arguments.method, "The method, such as list")->required();
@@ -88,12 +90,15 @@ int main(int argc, char** argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? kSuccess : kWrongUsage;
+        return orva::EndOfCommandLine("orva-webapi", app, error);
     }
 
     ::openlog("orva-webapi", LOG_PID | LOG_PERROR, LOG_DAEMON);
     if (!arguments.root.empty()) {
         orva::SetRoot(arguments.root);
+    }
+    if (const std::string problem = orva::RootProblem(); !problem.empty()) {
+        return Complain(kFailure, problem);
     }
     return Run(arguments);
 }

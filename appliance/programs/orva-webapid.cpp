@@ -11,6 +11,7 @@
 #include <string_view>
 #include <utility>
 
+#include "appliance/programs/UsageError.h"
 #include "appliance/root/Root.h"
 #include "appliance/server/AccessToken.h"
 #include "appliance/server/Authenticator.h"
@@ -27,10 +28,7 @@
 
 namespace {
 
-constexpr int kUsage = 2;
-
 constexpr char kTokenFile[] = "/usr/orva/etc/webapi.token";
-constexpr char kModulesDirectory[] = "/usr/orva/lib";
 constexpr char kPageDirectory[] = "/usr/orva/webui";
 
 // How long requests that have begun may still take after the signal to stop.
@@ -147,11 +145,6 @@ int Run(const Arguments& arguments) {
     const sigset_t signals = BlockStopSignals();
     LimitMemory();
     std::string error;
-    const std::optional<orva::AccessToken> token =
-        orva::AccessToken::LoadOrCreate(orva::ResolvePath(kTokenFile), error);
-    if (!token) {
-        return Fail(error);
-    }
     orva::HttpServer::Options options;
     options.limits.request = std::chrono::seconds(arguments.requestTimeout);
     const bool overTls = !arguments.tlsCertificate.empty();
@@ -165,10 +158,16 @@ int Run(const Arguments& arguments) {
     if (!socket) {
         return Fail(error);
     }
+    // Only now: a server that cannot start leaves nothing behind.
+    const std::optional<orva::AccessToken> token =
+        orva::AccessToken::LoadOrCreate(orva::ResolvePath(kTokenFile), error);
+    if (!token) {
+        return Fail(error);
+    }
     const std::string url = UrlFor(socket->Url(), overTls);
 
     const orva::ModuleLoader modules(
-        arguments.modules.empty() ? orva::ResolvePath(kModulesDirectory) : arguments.modules);
+        arguments.modules.empty() ? orva::ResolvePath(orva::kModulesDirectory) : arguments.modules);
     const orva::Dispatcher dispatcher(modules.Catalogue());
     orva::Authenticator authenticator(*token, overTls);
     const orva::PageFiles page(orva::ResolvePath(kPageDirectory));
@@ -200,8 +199,8 @@ int main(int argc, char** argv) {
     app.add_option("--listen", arguments.listen, "ADDRESS:PORT, [ADDRESS]:PORT or unix:PATH")
         ->capture_default_str();
     app.add_option("--modules", arguments.modules,
-                   std::string("Directory of the API modules (default: ") + kModulesDirectory +
-                       " below the root)");
+                   std::string("Directory of the API modules (default: ") +
+                       orva::kModulesDirectory + " below the root)");
     CLI::Option* certificate =
         app.add_option("--tls-cert", arguments.tlsCertificate,
                        "Serve by TLS with the certificates of this file (PEM)");
@@ -221,12 +220,15 @@ int main(int argc, char** argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? EXIT_SUCCESS : kUsage;
+        return orva::EndOfCommandLine("orva-webapid", app, error);
     }
 
     ::openlog("orva-webapid", LOG_PID | LOG_PERROR, LOG_DAEMON);
     if (!arguments.root.empty()) {
         orva::SetRoot(arguments.root);
+    }
+    if (const std::string problem = orva::RootProblem(); !problem.empty()) {
+        return Fail(problem);
     }
     return arguments.newSignInLink ? PrintNewSignInLink(arguments) : Run(arguments);
 }

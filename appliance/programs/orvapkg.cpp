@@ -9,13 +9,14 @@
 #include <vector>
 
 #include "appliance/package/PackageControl.h"
+#include "appliance/programs/UsageError.h"
 #include "appliance/recycle/ByteText.h"
 #include "appliance/root/Root.h"
 #include "platform/package.h"
 
 namespace {
 
-enum ExitStatus : int { kDone = 0, kFailed = 1, kUsage = 2, kNotRunning = 3 };
+enum ExitStatus : int { kDone = 0, kFailed = 1, kNotRunning = 3 };
 
 int Complain(const std::string& about) {
     std::fprintf(stderr, "orvapkg: %s\n", about.c_str());
@@ -110,12 +111,16 @@ int main(int argc, char** argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? kDone : kUsage;
+        return orva::EndOfCommandLine("orvapkg", app, error);
     }
 
+    // Not to standard error as well: the tool says there itself what failed.
     ::openlog("orvapkg", LOG_PID, LOG_USER);
     if (!root.empty()) {
         orva::SetRoot(root);
+    }
+    if (const std::string problem = orva::RootProblem(); !problem.empty()) {
+        return Complain(problem);
     }
     if (list->parsed()) {
         return List();

@@ -2,15 +2,18 @@
 #include <syslog.h>
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <charconv>
 #include <cstdint>
 #include <functional>
 #include <limits>
+#include <memory>
 #include <optional>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "appliance/programs/UsageError.h"
 #include "appliance/root/Root.h"
 #include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskStore.h"
@@ -19,6 +22,7 @@
 #include "appliance/tools/ComingStarts.h"
 #include "appliance/tools/History.h"
 #include "appliance/tools/Services.h"
+#include "appliance/tools/StoreToRead.h"
 #include "appliance/tools/TaskFiles.h"
 #include "appliance/tools/ToolOutput.h"
 
@@ -45,7 +49,50 @@ struct Arguments {
 struct Verb {
     const CLI::Option* option;
     std::function<int()> run;
+    // It reads a task store and makes none.
+    bool needsStore = true;
 };
+
+constexpr const char* kStartService = "--start-service";
+constexpr const char* kStopService = "--stop-service";
+
+// Takes the words after `verb`, up to the next switch, out of the command line: they are names
+// whatever they look like, and the parser would read some of them in its own way.
+std::vector<std::string> TakeNames(std::vector<std::string>& words, const std::string& verb) {
+    std::vector<std::string> names;
+    for (auto word = words.begin(); word != words.end();) {
+        if (*word++ == verb) {
+            const auto end = std::find_if(
+                word, words.end(), [](const std::string& each) { return each.starts_with("--"); });
+            names.insert(names.end(), word, end);
+            word = words.erase(word, end);
+        }
+    }
+    return names;
+}
+
+void AddNames(const std::vector<std::string>& taken, std::vector<std::string>& names) {
+    // So the parser says that there were none.
+    if (names == std::vector<std::string>{""}) {
+        names.clear();
+    }
+    names.insert(names.end(), taken.begin(), taken.end());
+}
+
+int ChangeServices(const char* verb, const std::vector<std::string>& names,
+                   int (*change)(const std::vector<std::string>&)) {
+    return names.empty() ? orva::ComplainOfUsage(std::string(verb) + " needs NAME...")
+                         : change(names);
+}
+
+// Tasks whose rows are damaged stand in no list: they are named, and the verb has failed.
+int NameDamaged(int status) {
+    const std::shared_ptr<const orva::Snapshot> tasks = orva::TasksToRead();
+    for (const orva::DamagedTask& task : tasks->Damaged()) {
+        status = orva::Complain(task.problem + ": it is left out");
+    }
+    return status;
+}
 
 std::vector<Verb> AddTaskVerbs(CLI::Option_group& verbs, Arguments& arguments) {
     const CLI::Option* importing =
@@ -65,13 +112,13 @@ std::vector<Verb> AddTaskVerbs(CLI::Option_group& verbs, Arguments& arguments) {
     const CLI::Option* listing =
         verbs.add_flag("--list", arguments.list, "Show all tasks, one line each");
     return {
-        {importing, [&] { return orva::ImportTaskFile(arguments.importFile); }},
+        {importing, [&] { return orva::ImportTaskFile(arguments.importFile); }, false},
         {exporting,
          [&] {
-             return orva::ExportTaskFile(arguments.exportFile.empty() ? orva::kStandardStream
-                                                                      : arguments.exportFile);
+             return NameDamaged(orva::ExportTaskFile(
+                 arguments.exportFile.empty() ? orva::kStandardStream : arguments.exportFile));
          }},
-        {listing, [] { return orva::ListTasks(); }},
+        {listing, [] { return NameDamaged(orva::ListTasks()); }},
     };
 }
 
@@ -91,7 +138,7 @@ std::vector<Verb> AddHistoryVerbs(CLI::Option_group& verbs, Arguments& arguments
                             std::to_string(orva::ComingStartsRequest::kMost) + ")")
             ->type_name("N ID")
             ->expected(2)
-            ->check(CLI::Range(1, kHighest));
+            ->check(CLI::Range(1, kHighest).description(""));
     const CLI::Option* history =
         verbs
             .add_option("--history", arguments.historyTask,
@@ -102,7 +149,8 @@ std::vector<Verb> AddHistoryVerbs(CLI::Option_group& verbs, Arguments& arguments
     const CLI::Option* output =
         verbs.add_option("--output", arguments.outputRun, "Show what a run has printed")
             ->type_name("RUN")
-            ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()));
+            ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max())
+                        .description(""));
     return {
         {next,
          [&] {
@@ -121,8 +169,7 @@ std::vector<Verb> AddHistoryVerbs(CLI::Option_group& verbs, Arguments& arguments
              }
              const std::optional<int> task = ParseTaskId(arguments.historyTask);
              if (!task) {
-                 orva::Complain("--history takes the id of a task");
-                 return orva::kToolUsage;
+                 return orva::ComplainOfUsage("--history takes the id of a task");
              }
              return orva::ShowHistory(task, arguments.json);
          }},
@@ -138,17 +185,23 @@ std::vector<Verb> AddMachineVerbs(CLI::Option_group& verbs, Arguments& arguments
                         "is none")
             ->type_name("SECONDS");
     const CLI::Option* start =
-        verbs.add_option("--start-service", arguments.startServices, "Start these services")
+        verbs.add_option(kStartService, arguments.startServices, "Start these services")
             ->type_name("NAME...")
-            ->expected(1, std::numeric_limits<int>::max());
+            ->expected(0, std::numeric_limits<int>::max());
     const CLI::Option* stop =
-        verbs.add_option("--stop-service", arguments.stopServices, "Stop these services")
+        verbs.add_option(kStopService, arguments.stopServices, "Stop these services")
             ->type_name("NAME...")
-            ->expected(1, std::numeric_limits<int>::max());
+            ->expected(0, std::numeric_limits<int>::max());
     return {
-        {beep, [&] { return orva::Beep(arguments.beepSeconds); }},
-        {start, [&] { return orva::StartServices(arguments.startServices); }},
-        {stop, [&] { return orva::StopServices(arguments.stopServices); }},
+        {beep, [&] { return orva::Beep(arguments.beepSeconds); }, false},
+        {start,
+         [&] {
+             return ChangeServices(kStartService, arguments.startServices, orva::StartServices);
+         },
+         false},
+        {stop,
+         [&] { return ChangeServices(kStopService, arguments.stopServices, orva::StopServices); },
+         false},
     };
 }
 
@@ -156,7 +209,7 @@ int Run(const std::vector<Verb>& verbs) {
     try {
         for (const Verb& verb : verbs) {
             if (verb.option->count() > 0) {
-                return verb.run();
+                return verb.needsStore && !orva::HasStoreFolder() ? orva::kToolFailed : verb.run();
             }
         }
     } catch (const orva::StoreFailure& failure) {
@@ -174,6 +227,7 @@ int main(int argc, char** argv) {
         "The scheduled tasks of the appliance: in and out, what is coming and what happened; and "
         "what tasks do to the machine itself.\n"
         "Exit status: 0 done, 1 failed, 2 wrong usage.");
+    app.name("orvaschedtool");
     app.add_option("--root", arguments.root,
                    "The directory that the appliance lives below (default: ORVA_ROOT, or /)")
         ->type_name("DIR");
@@ -194,16 +248,22 @@ int main(int argc, char** argv) {
         ->type_name("NAME")
         ->needs("--next");
     app.add_flag("--json", arguments.json, "With --next and --history: one JSON array");
+    std::vector<std::string> words(argv + std::min(argc, 1), argv + argc);
+    const std::vector<std::string> starting = TakeNames(words, kStartService);
+    const std::vector<std::string> stopping = TakeNames(words, kStopService);
     try {
-        app.parse(argc, argv);
+        // It wants the last word first.
+        app.parse(std::vector<std::string>(words.rbegin(), words.rend()));
     } catch (const CLI::ParseError& error) {
-        return app.exit(error) == 0 ? orva::kToolDone : orva::kToolUsage;
+        return orva::EndOfCommandLine("orvaschedtool", app, error);
     }
+    AddNames(starting, arguments.startServices);
+    AddNames(stopping, arguments.stopServices);
     if (arguments.json && app.count("--next") == 0 && app.count("--history") == 0) {
-        orva::Complain("--json goes with --next and --history only");
-        return orva::kToolUsage;
+        return orva::ComplainOfUsage("--json goes with --next and --history only");
     }
 
+    // Not to standard error as well: the tool says there itself what failed.
     openlog("orvaschedtool", LOG_PID, LOG_USER);
     if (!arguments.root.empty()) {
         orva::SetRoot(arguments.root);

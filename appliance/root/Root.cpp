@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <mutex>
+#include <system_error>
 
 namespace orva {
 namespace {
@@ -49,6 +50,17 @@ void SetRoot(const std::string& directory) {
     const std::lock_guard lock(state.mutex);
     state.root = Normalise(directory);
     ::setenv("ORVA_ROOT", state.root.c_str(), 1);
+}
+
+std::string RootProblem() {
+    const std::string root = Root();
+    std::error_code error;
+    const bool isDirectory = std::filesystem::is_directory(root, error);
+    if (isDirectory) {
+        return {};
+    }
+    return "the root " + root + ": " +
+           (error ? error : std::make_error_code(std::errc::not_a_directory)).message();
 }
 
 std::string ResolvePath(std::string_view path) {

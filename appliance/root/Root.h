@@ -17,6 +17,11 @@ std::string Root();
 // children find the same appliance.
 void SetRoot(const std::string& directory);
 
+// Why the root can hold no appliance, as "the root /x: No such file or directory"; empty when it is
+// a directory. Programs that make what they miss ask first: a mistyped root would become a second
+// appliance.
+[[nodiscard]] std::string RootProblem();
+
 // The place of `path`, an absolute path of the appliance ("/usr/orva/etc/orva.conf"), below the
 // root.
 std::string ResolvePath(std::string_view path);

@@ -7,18 +7,16 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
 
 #include "appliance/util/FileDescriptor.h"
+#include "appliance/util/Text.h"
 
 namespace orva {
 namespace {
 
 constexpr std::size_t kTokenBytes = 32;
 constexpr std::size_t kTokenDigits = 2 * kTokenBytes;
-
-std::string ErrnoText() { return std::strerror(errno); }
 
 bool IsToken(std::string_view text) {
     return text.size() == kTokenDigits && std::all_of(text.begin(), text.end(), [](char c) {

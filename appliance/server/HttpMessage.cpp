@@ -78,13 +78,6 @@ bool EqualIgnoringCase(std::string_view a, std::string_view b) {
                                               [](char x, char y) { return Lower(x) == Lower(y); });
 }
 
-std::string_view TrimBlanks(std::string_view text) {
-    const std::size_t first = text.find_first_not_of(" \t");
-    const std::size_t last = text.find_last_not_of(" \t");
-    return first == std::string_view::npos ? std::string_view()
-                                           : text.substr(first, last - first + 1);
-}
-
 std::optional<std::string_view> HttpRequest::Header(std::string_view name) const {
     for (const auto& [field, value] : headers) {
         if (EqualIgnoringCase(field, name)) {

@@ -58,11 +58,8 @@ struct HttpResponse {
 // Whether two ASCII texts are the same but for the case of their letters.
 bool EqualIgnoringCase(std::string_view a, std::string_view b);
 
-// The text without spaces and tabs at its ends.
-std::string_view TrimBlanks(std::string_view text);
-
 // Splits and decodes a request target ("/webapi?lang=de", or the same after "http://host") into
 // path and query. False when it is neither, when an escape in it is broken, or when it holds a NUL.
-bool ParseTarget(std::string_view target, HttpRequest& request);
+[[nodiscard]] bool ParseTarget(std::string_view target, HttpRequest& request);
 
 }  // namespace orva

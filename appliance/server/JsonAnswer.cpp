@@ -2,6 +2,8 @@
 
 #include <string_view>
 
+#include "appliance/util/Text.h"
+
 namespace orva {
 namespace {
 

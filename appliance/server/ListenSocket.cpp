@@ -11,13 +11,13 @@
 #include <cstring>
 #include <string_view>
 
+#include "appliance/util/Text.h"
+
 namespace orva {
 namespace {
 
 constexpr std::string_view kUnixPrefix = "unix:";
 constexpr int kBacklog = 511;
-
-std::string ErrnoText() { return std::strerror(errno); }
 
 std::optional<std::uint16_t> ReadPort(std::string_view text) {
     std::uint16_t port = 0;

@@ -9,6 +9,7 @@
 
 #include "appliance/server/OpenBeneath.h"
 #include "appliance/server/Secret.h"
+#include "appliance/util/Text.h"
 
 namespace orva {
 namespace {

@@ -100,8 +100,7 @@ int Beep(std::string_view seconds) { return Beep(seconds, BuzzerPlaces(), Termin
 int Beep(std::string_view seconds, const BuzzerPlaces& places, int terminal) {
     const std::optional<std::chrono::seconds> length = ParseSeconds(seconds);
     if (!length) {
-        Complain("--beep needs a number of seconds from 1 to 600");
-        return kToolUsage;
+        return ComplainOfUsage("--beep needs a number of seconds from 1 to 600");
     }
     std::string problem;
     const std::unique_ptr<Buzzer> buzzer = OpenBuzzer(places, problem);

@@ -11,6 +11,7 @@
 #include "appliance/schedule/StartText.h"
 #include "appliance/schedule/StartTimes.h"
 #include "appliance/store/TaskStore.h"
+#include "appliance/tools/StoreToRead.h"
 #include "appliance/tools/ToolOutput.h"
 #include "appliance/webapi/JsonWriter.h"
 
@@ -52,26 +53,24 @@ std::string AsLines(const std::vector<Start>& starts, const absl::TimeZone& zone
 
 int ShowComingStarts(const ComingStartsRequest& request) {
     if (request.count < 1 || request.count > ComingStartsRequest::kMost) {
-        Complain("--next shows 1 to " + std::to_string(ComingStartsRequest::kMost) + " starts");
-        return kToolUsage;
+        return ComplainOfUsage("--next shows 1 to " + std::to_string(ComingStartsRequest::kMost) +
+                               " starts");
     }
     const std::shared_ptr<TaskStore> current = TaskStore::Current();
     TaskStore& store = *current;
     absl::TimeZone zone = store.Zone();
     if (!request.zone.empty() && !absl::LoadTimeZone(request.zone, &zone)) {
-        Complain("--zone: no time zone \"" + request.zone + "\"");
-        return kToolUsage;
+        return ComplainOfUsage("--zone: no time zone \"" + request.zone + "\"");
     }
     absl::Time from = store.Now();
     if (!request.from.empty()) {
         const std::optional<absl::Time> instant = ParseUtcInstant(request.from);
         if (!instant) {
-            Complain("--from needs a UTC instant such as 2027-01-31T12:00:00Z");
-            return kToolUsage;
+            return ComplainOfUsage("--from needs a UTC instant such as 2027-01-31T12:00:00Z");
         }
         from = *instant;
     }
-    const SharedTask task = store.Find(request.task);
+    const SharedTask task = HasDatabase() ? store.Find(request.task) : nullptr;
     if (task == nullptr) {
         return Complain("there is no task " + std::to_string(request.task));
     }

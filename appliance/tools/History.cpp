@@ -9,6 +9,7 @@
 
 #include "appliance/runs/RunDocument.h"
 #include "appliance/runs/RunStore.h"
+#include "appliance/tools/StoreToRead.h"
 #include "appliance/tools/ToolOutput.h"
 #include "appliance/webapi/JsonWriter.h"
 
@@ -30,13 +31,16 @@ Json::Value HistoryDocument(const Run& run) {
 }
 
 std::string ResultText(const Run& run) {
+    std::string result;
     if (run.exitStatus) {
-        return "exit status " + std::to_string(*run.exitStatus);
+        result = "exit status " + std::to_string(*run.exitStatus);
+    } else if (run.signal) {
+        result = "signal " + std::to_string(*run.signal);
     }
-    if (run.signal) {
-        return "signal " + std::to_string(*run.signal);
+    if (run.why.empty() || result.empty()) {
+        return result + run.why;
     }
-    return run.why;
+    return run.why + " (" + result + ")";
 }
 
 // What a terminal would take for a command to it is shown as "?".
@@ -80,7 +84,8 @@ int ShowHistory(std::optional<int> task, bool json) {
     bool first = true;
     std::int64_t last = std::numeric_limits<std::int64_t>::max();
     for (std::int64_t offset = 0;; offset += kPart) {
-        const RunStore::Page page = store.List({task, {}}, offset, kPart);
+        const RunStore::Page page =
+            HasDatabase() ? store.List({task, {}}, offset, kPart) : RunStore::Page();
         for (const Run& run : page.runs) {
             // New runs push the others along: some of this part were in the one before.
             if (run.id >= last) {
@@ -107,11 +112,17 @@ int ShowHistory(std::optional<int> task, bool json) {
 }
 
 int ShowRunOutput(std::int64_t run) {
-    const std::optional<RunOutput> output = RunStore::Current()->Output(run);
+    const std::shared_ptr<RunStore> store = RunStore::Current();
+    // The state first: what comes with an ended run is all that will ever come.
+    const std::optional<Run> found = HasDatabase() ? store->Find(run) : std::nullopt;
+    const std::optional<RunOutput> output = found ? store->Output(run) : std::nullopt;
     if (!output) {
         return Complain("there is no run " + std::to_string(run));
     }
     const int status = WriteOut(output->head + output->tail);
+    if (status == kToolDone && found->state == RunState::kRunning) {
+        Complain("run " + std::to_string(run) + " still goes on");
+    }
     if (status == kToolDone && output->dropped > 0) {
         Complain(std::to_string(output->dropped) + " bytes after the first " +
                  std::to_string(output->head.size()) + " were not kept");

@@ -9,6 +9,11 @@ int Complain(const std::string& about) {
     return kToolFailed;
 }
 
+int ComplainOfUsage(const std::string& about) {
+    Complain(about + " (see orvaschedtool --help)");
+    return kToolUsage;
+}
+
 int WriteOut(std::string_view text) {
     const bool written = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
     return std::fflush(stdout) == 0 && written ? kToolDone : Complain("cannot write the output");

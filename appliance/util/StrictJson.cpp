@@ -8,14 +8,13 @@
 #include <memory>
 #include <new>
 
+#include "appliance/util/Text.h"
 #include "appliance/util/Utf8.h"
 
 namespace orva {
 namespace {
 
 constexpr int kMaxDepth = 64;
-
-bool IsDigit(char byte) { return byte >= '0' && byte <= '9'; }
 
 // Checks what jsoncpp's reader lets pass: bytes, texts, escapes, numbers and nesting. The order of
 // the tokens is left to that reader.

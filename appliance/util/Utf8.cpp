@@ -43,4 +43,15 @@ std::size_t ValidUtf8Length(std::string_view text) {
     return at;
 }
 
+char32_t TakeCharacter(std::string_view& text) {
+    const auto lead = static_cast<unsigned char>(text.front());
+    const std::size_t length = lead < 0x80 ? 1 : lead < 0xe0 ? 2 : lead < 0xf0 ? 3 : 4;
+    char32_t character = length == 1 ? lead : lead & (0x7fU >> length);
+    for (std::size_t at = 1; at < length; ++at) {
+        character = character << 6U | (static_cast<unsigned char>(text[at]) & 0x3fU);
+    }
+    text.remove_prefix(length);
+    return character;
+}
+
 }  // namespace orva

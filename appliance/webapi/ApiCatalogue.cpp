@@ -8,9 +8,14 @@ namespace orva {
 bool ApiCatalogue::Add(const std::vector<ApiMethodEntry>& entries, std::string& conflict) {
     std::set<std::tuple<std::string_view, std::int32_t, std::string_view>> own;
     for (const ApiMethodEntry& entry : entries) {
-        const bool repeated = !own.emplace(entry.api, entry.version, entry.method).second;
-        if (repeated || Lookup(entry.api, entry.version, entry.method).found == Found::kMethod) {
-            conflict = entry.api + " " + std::to_string(entry.version) + " " + entry.method;
+        const std::string version = entry.api + " " + std::to_string(entry.version);
+        if (const auto api = apis.find(entry.api);
+            api != apis.end() && api->second.count(entry.version) != 0) {
+            conflict = "another module has " + version + " already";
+            return false;
+        }
+        if (!own.emplace(entry.api, entry.version, entry.method).second) {
+            conflict = "another row has " + version + " " + entry.method + " already";
             return false;
         }
     }

@@ -33,9 +33,10 @@ class ApiCatalogue {
         ORVA::APIMethod function = nullptr;
     };
 
-    // Adds all entries, or none when one of them has an API, version and method that another has
-    // already; `conflict` then names it.
-    bool Add(const std::vector<ApiMethodEntry>& entries, std::string& conflict);
+    // Adds a module's entries. An API's version belongs to the module that brought it first: none
+    // is added when one of them has an API and version of an earlier call, or when two of them have
+    // the same API, version and method; `conflict` then says which.
+    [[nodiscard]] bool Add(const std::vector<ApiMethodEntry>& entries, std::string& conflict);
 
     LookupResult Lookup(std::string_view api, std::int32_t version, std::string_view method) const;
 

@@ -5,6 +5,7 @@
 
 #include <exception>
 
+#include "appliance/util/CallScope.h"
 #include "appliance/util/StrictJson.h"
 
 namespace orva {
@@ -59,6 +60,7 @@ ApiAnswer Dispatcher::Call(std::string_view api, std::int32_t version, std::stri
             return MakeErrorAnswer(400, ApiError::kBadDocument, "the body is not a JSON object");
         }
         ORVA::APIRequest request(std::move(*parameters), language);
+        const CallScope scope;
         result.function(&request, &answer.response);
     } catch (const Json::Exception& exception) {
         // Mostly the caller's doing, but a damaged stored document ends here too.

@@ -6,32 +6,21 @@
 #include <vector>
 
 #include "appliance/root/Root.h"
+#include "appliance/util/Text.h"
 
 namespace orva {
 namespace {
 
-constexpr char kTextsDirectory[] = "/usr/orva/orvaman/webman/texts/";
 constexpr std::size_t kLongestGroup = 8;
 constexpr std::size_t kLongestTag = 35;
 // Of a header with more languages than anybody reads, the first ones count.
 constexpr std::size_t kMostRanges = 16;
 
 bool IsLetter(char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z'); }
-bool IsDigit(char c) { return c >= '0' && c <= '9'; }
 
 bool HaveTexts(const std::string& language) {
     std::error_code error;
     return std::filesystem::is_directory(ResolvePath(kTextsDirectory + language), error);
-}
-
-std::string_view Trim(std::string_view text) {
-    while (!text.empty() && (text.front() == ' ' || text.front() == '\t')) {
-        text.remove_prefix(1);
-    }
-    while (!text.empty() && (text.back() == ' ' || text.back() == '\t')) {
-        text.remove_suffix(1);
-    }
-    return text;
 }
 
 // The part of `text` before `separator`, taken away from it together with the separator.
@@ -70,8 +59,8 @@ std::vector<Range> ReadRanges(std::string_view header) {
     while (!header.empty() && ranges.size() < kMostRanges) {
         std::string_view element = TakeUpTo(',', header);
         Range range;
-        range.tag = Trim(TakeUpTo(';', element));
-        const std::string_view parameter = Trim(element);
+        range.tag = TrimBlanks(TakeUpTo(';', element));
+        const std::string_view parameter = TrimBlanks(element);
         if (!parameter.empty()) {
             const bool isWeight = parameter.substr(0, 2) == "q=" || parameter.substr(0, 2) == "Q=";
             range.weight = isWeight ? ReadWeight(parameter.substr(2)).value_or(0) : 0;

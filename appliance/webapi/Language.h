@@ -9,6 +9,9 @@ namespace orva {
 // The language of an interface that asks for none that the appliance has texts in.
 inline constexpr char kDefaultLanguage[] = "en";
 
+// The texts of the interface, a folder for each language.
+inline constexpr const char* kTextsDirectory = "/usr/orva/orvaman/webman/texts/";
+
 // Whether `tag` has the form of a language tag: letters, then groups of letters and digits after
 // "-" or "_". Such a text is safe as the name of a directory.
 bool IsLanguageTag(std::string_view tag);

@@ -97,9 +97,7 @@ bool ModuleLoader::Load(const std::string& file, std::string& reason) {
     if (!ReadTable(tableOf(), entries, reason)) {
         return false;
     }
-    std::string conflict;
-    if (!catalogue.Add(entries, conflict)) {
-        reason = "another module or row has " + conflict + " already";
+    if (!catalogue.Add(entries, reason)) {
         return false;
     }
     libraries.push_back(std::move(library));

@@ -8,6 +8,9 @@
 
 namespace orva {
 
+// Where the appliance's own modules are.
+inline constexpr const char* kModulesDirectory = "/usr/orva/lib";
+
 // The API modules of a directory, loaded for as long as this object lives: no method of them may be
 // called after it.
 //
@@ -16,10 +19,11 @@ namespace orva {
 class ModuleLoader {
   public:
     // Loads every file "*.so" of `directory` in ascending order of the names' bytes. One that
-    // cannot be loaded, that anybody may write, that offers no table or a malformed one, or whose
-    // table repeats a method that is already there, is left out as a whole, and one log line says
-    // why. A directory that cannot be read holds no module, with a log line too. The platform's
-    // library, liborva.so, may stand in the same directory and is passed over.
+    // cannot be loaded, that anybody may write, that offers no table or a malformed one, whose
+    // table has a method twice, or names an API's version that an earlier module has, is left out
+    // as a whole, and one log line says why. A directory that cannot be read holds no module, with
+    // a log line too. The platform's library, liborva.so, may stand in the same directory and is
+    // passed over.
     explicit ModuleLoader(const std::string& directory);
 
     const ApiCatalogue& Catalogue() const { return catalogue; }

@@ -21,6 +21,15 @@ class ApplianceTest : public ModuleTest {
                     const std::string& language = "en") const {
         return ModuleTest::Ask("ORVA.Core.Appliance", method, body, language);
     }
+
+    // A scheduler seems to be alive for as long as this is open.
+    orva::FileDescriptor ActAsScheduler() const {
+        MakeDirectory("/run/orva");
+        orva::FileDescriptor lock(::open((RootPath() + "/run/orva/schedd.lock").c_str(),
+                                         O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+        EXPECT_EQ(::flock(lock.Get(), LOCK_EX), 0);
+        return lock;
+    }
 };
 
 TEST_F(ApplianceTest, SharesTellWhetherTheirRecycleBinsAreOn) {
@@ -63,19 +72,23 @@ TEST_F(ApplianceTest, InfoTellsOfTheMachineAndItsScheduler) {
     EXPECT_THAT(before,
                 testing::AnyOf(HasSubstr(R"("buzzer":false)"), HasSubstr(R"("buzzer":true)")));
 
-    MakeDirectory("/run/orva");
-    const orva::FileDescriptor lock(
-        ::open((RootPath() + "/run/orva/schedd.lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
-    ASSERT_EQ(::flock(lock.Get(), LOCK_EX), 0);
+    const orva::FileDescriptor lock = ActAsScheduler();
     EXPECT_THAT(Ask("info"), HasSubstr(R"("scheduler":true)"));
 }
 
 TEST_F(ApplianceTest, TheRevisionGrowsWhenATaskOrARunChanges) {
-    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":0}})");
+    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":0,"scheduler":false}})");
     orva::TaskStore::Current()->Save(SampleTask("a"));
-    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":1}})");
+    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":1,"scheduler":false}})");
     AddRun();
-    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":2}})");
+    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":2,"scheduler":false}})");
+}
+
+TEST_F(ApplianceTest, TheRevisionTellsWhetherASchedulerIsAlive) {
+    orva::FileDescriptor lock = ActAsScheduler();
+    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":0,"scheduler":true}})");
+    lock = orva::FileDescriptor();
+    EXPECT_EQ(Ask("revision"), R"({"success":true,"data":{"revision":0,"scheduler":false}})");
 }
 
 }  // namespace

@@ -68,6 +68,25 @@ TEST_F(CleanPreviewTest, WithoutSharesItLooksAtAll) {
     EXPECT_THAT(Preview(R"({"keep_smaller":4})"), HasSubstr(R"("rule":"smaller")"));
 }
 
+TEST_F(CleanPreviewTest, ZeroDaysAndZeroBytesMeanWhatTheyMeanToTheCleaner) {
+    InstallCleaner();
+    EXPECT_THAT(Preview(R"({"days":0})"), HasSubstr(R"("remove":{"bytes":15,"count":3})"));
+    EXPECT_THAT(Preview(R"({"bytes":0})"), HasSubstr(R"("remove":{"bytes":15,"count":3})"));
+    EXPECT_THAT(Preview(R"({"bytes":0,"order":"largest","extensions":["pdf"]})"),
+                HasSubstr(R"("remove":{"bytes":12,"count":2})"));
+}
+
+TEST_F(CleanPreviewTest, ExtensionsAreReadAsThoseOfATaskAre) {
+    InstallCleaner();
+    for (const char* extensions : {R"(["txt.pdf"])", R"([".pdf","TXT"])", R"(["","pdf"," txt "])",
+                                   R"(["tar.gz.pdf","two words","\u00e4","txt"])"}) {
+        EXPECT_THAT(Preview(R"({"extensions":)" + std::string(extensions) + "}"),
+                    HasSubstr(R"("keep":{"bytes":8,"count":2})"))
+            << extensions;
+    }
+    EXPECT_THAT(Preview(R"({"extensions":[]})"), HasSubstr(R"("remove":{"bytes":15,"count":3})"));
+}
+
 TEST_F(CleanPreviewTest, AShareThatIsUnknownMakesItIncomplete) {
     InstallCleaner();
     EXPECT_THAT(Preview(R"({"shares":["--enable","docs"]})"),
@@ -86,10 +105,15 @@ TEST_F(CleanPreviewTest, WhatTheCleanerWouldNotUnderstandIsRefusedFirst) {
     refused(R"({"bytes":1,"days":1})", "bytes: cannot be combined with days");
     refused(R"({"bytes":1,"order":"newest"})", "order: is neither oldest nor largest");
     refused(R"({"extensions":"pdf"})", "extensions: is no array of at most 100 texts");
-    refused(R"({"extensions":["a.b"]})",
-            "extensions: holds something that is no extension of letters, digits, _ + and -");
-    refused(R"({"extensions":[""]})",
-            "extensions: holds something that is no extension of letters, digits, _ + and -");
+    for (const char* text : {R"(a\"b)", "a$b", "a`b", R"(a\\b)", R"(a\nb)", R"(a\tb)"}) {
+        refused(
+            R"({"extensions":[")" + std::string(text) + "\"]}",
+            "extensions: holds a quote, $, `, \\ or a control character, which the command of a "
+            "task cannot carry");
+    }
+    refused(R"({"extensions":[""," ","."]})", "extensions: names no extension");
+    refused(R"({"extensions":[")" + std::string(101, 'x') + "\"]}",
+            "extensions: holds a text of more than 100 bytes");
     refused(R"({"shares":[1]})", "shares: holds something that is no text");
     refused(R"({"shares":[""]})", "shares: holds something that is no name of a share");
     refused(R"({"keep_larger":1.5})", "keep_larger: is no integer from 0 to 9223372036854775807");

@@ -173,6 +173,15 @@ TEST_F(TaskHistoryTest, ARunThatIsNotThereIsToldApartFromOneThatCannotBeStopped)
     EXPECT_EQ(Ask("stop", R"({"run":1})"), Refusal(123, "no scheduler is running"));
 }
 
+TEST_F(TaskHistoryTest, ARunThatWaitsIsCancelledWithoutAScheduler) {
+    AddRun("state", "'queued'");
+    EXPECT_EQ(Ask("stop", R"({"run":1})"), R"({"success":true,"data":{}})");
+    EXPECT_THAT(Ask("list"),
+                AllOf(HasSubstr(R"("state":"skipped")"), HasSubstr(R"("why":"stopped")"),
+                      HasSubstr(R"("ended":null,"exit_status":null)")));
+    EXPECT_EQ(Ask("stop", R"({"run":1})"), Refusal(123, "no scheduler is running"));
+}
+
 TEST_F(TaskHistoryTest, AStoreThatFailsIsToldAndLogged) {
     orva::TaskStore::Configure({});
     Write("/usr/orva/var/tasks.db", std::string(5000, 'x'));

@@ -127,6 +127,29 @@ TEST_F(OrvaWebapiTest, ReturnsTwoForWrongUsage) {
     }
 }
 
+TEST_F(OrvaWebapiTest, ReturnsOneWhenTheAnswerCannotBeWritten) {
+    const std::string call = std::string("exec ") + ORVA_BIN_DIR "/orva-webapi --root " +
+                             sandbox.Path().string() + " Test.Echo 1 \"$0\" >/dev/full";
+    const ProcessResult echoed = orva::test::RunProcess({"/bin/sh", "-c", call, "echo"});
+    EXPECT_EQ(echoed.status, 1);
+    EXPECT_EQ(echoed.err,
+              "orva-webapi: the answer could not be written; the call itself was carried out\n");
+    const ProcessResult refused = orva::test::RunProcess({"/bin/sh", "-c", call, "refuse"});
+    EXPECT_EQ(refused.status, 1);
+    EXPECT_EQ(refused.err,
+              "orva-webapi: the answer could not be written; the call itself failed\n");
+}
+
+TEST_F(OrvaWebapiTest, NamesARootThatIsNoDirectory) {
+    const std::string root = (sandbox.Path() / "misspelt").string();
+    const ProcessResult result = orva::test::RunProcess(
+        {ORVA_BIN_DIR "/orva-webapi", "--root", root, "Test.Echo", "1", "echo"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err, "orva-webapi: the root " + root + ": No such file or directory\n");
+    EXPECT_FALSE(std::filesystem::exists(root));
+}
+
 TEST_F(OrvaWebapiTest, ExplainsItself) {
     const ProcessResult result = Run({"--help"});
     EXPECT_EQ(result.status, 0);

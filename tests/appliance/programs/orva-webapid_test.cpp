@@ -3,6 +3,7 @@
 #include <signal.h>
 #include <sys/stat.h>
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -72,6 +73,28 @@ TEST_F(OrvaWebapidTest, RefusesToStartWithADamagedToken) {
     EXPECT_EQ(result.status, 1);
     EXPECT_THAT(result.err, HasSubstr("it does not hold a token of 64 hexadecimal digits\n"));
     EXPECT_THAT(result.err, testing::Not(HasSubstr("damaged\n")));
+}
+
+TEST_F(OrvaWebapidTest, MakesNothingBelowARootThatIsNotThere) {
+    const std::string root = (server.Root().Path() / "misspelt").string();
+    for (const char* more : {"--request-timeout=5", "--new-sign-in-link"}) {
+        const ProcessResult result = RunProcess(
+            {ORVA_BIN_DIR "/orva-webapid", "--root", root, "--listen", "127.0.0.1:0", more});
+        EXPECT_EQ(result.status, 1);
+        EXPECT_EQ(result.out, "");
+        EXPECT_THAT(result.err,
+                    testing::EndsWith(": the root " + root + ": No such file or directory\n"));
+        EXPECT_FALSE(std::filesystem::exists(root));
+    }
+    const std::string file = server.Root().Write("file", "");
+    EXPECT_THAT(RunProcess({ORVA_BIN_DIR "/orva-webapid", "--root", file}).err,
+                testing::EndsWith(": the root " + file + ": Not a directory\n"));
+}
+
+TEST_F(OrvaWebapidTest, MakesNoTokenWhenItCannotStart) {
+    EXPECT_EQ(Run({}, "nowhere").status, 1);
+    EXPECT_EQ(Run({"--tls-cert", "/none", "--tls-key", "/none"}).status, 1);
+    EXPECT_FALSE(std::filesystem::exists(server.Root().Path() / "usr/orva/etc"));
 }
 
 TEST_F(OrvaWebapidTest, SaysWhyItCannotListen) {

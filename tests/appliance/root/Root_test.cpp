@@ -35,6 +35,15 @@ TEST(RootTest, TellsChildrenOfTheProgram) {
     EXPECT_STREQ(::getenv("ORVA_ROOT"), "/srv/box");
 }
 
+TEST(RootTest, SaysWhyItCanHoldNoAppliance) {
+    orva::SetRoot("/no/such/place");
+    EXPECT_EQ(orva::RootProblem(), "the root /no/such/place: No such file or directory");
+    orva::SetRoot("/dev/null");
+    EXPECT_EQ(orva::RootProblem(), "the root /dev/null: Not a directory");
+    orva::SetRoot("/dev");
+    EXPECT_EQ(orva::RootProblem(), "");
+}
+
 // What a fresh process makes of its environment; it says so by its exit status.
 void ExpectFirstRoot(const char* environment, const char* root) {
     EXPECT_EXIT(

@@ -60,12 +60,6 @@ TEST(HttpMessage, FindsHeaderFieldsInAnyCase) {
     EXPECT_EQ(request.CountHeaders("Host"), 0U);
 }
 
-TEST(HttpMessage, TrimsBlanks) {
-    EXPECT_EQ(orva::TrimBlanks(" \ta b\t "), "a b");
-    EXPECT_EQ(orva::TrimBlanks(" \t"), "");
-    EXPECT_EQ(orva::TrimBlanks(""), "");
-}
-
 std::string PeerText(const char* ipv6) {
     sockaddr_in6 address{};
     address.sin6_family = AF_INET6;

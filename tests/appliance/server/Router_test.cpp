@@ -28,7 +28,7 @@ class RouterTest : public testing::Test {
   protected:
     RouterTest() {
         std::string conflict;
-        catalogue.Add({{"Test.Echo", 1, "echo", &Echo}}, conflict);
+        EXPECT_TRUE(catalogue.Add({{"Test.Echo", 1, "echo", &Echo}}, conflict));
         const std::string file = sandbox.Write("token", kToken);
         ::chmod(file.c_str(), 0600);
         std::string error;

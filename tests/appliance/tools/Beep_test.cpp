@@ -100,7 +100,9 @@ TEST_F(BeepTest, TakesPlainNumbersFromOneToSixHundredOnly) {
     for (const char* seconds : {"", "0", "601", "-1", "+1", "1.5", "1s", " 1", "1 ", "0x10", "one",
                                 "99999999999999999999"}) {
         EXPECT_EQ(Run(seconds), 2) << seconds;
-        EXPECT_EQ(err, "orvaschedtool: --beep needs a number of seconds from 1 to 600\n");
+        EXPECT_EQ(err,
+                  "orvaschedtool: --beep needs a number of seconds from 1 to 600 (see "
+                  "orvaschedtool --help)\n");
     }
     EXPECT_THAT(Sounds("event0"), IsEmpty());
 }

@@ -97,16 +97,20 @@ TEST_F(ComingStartsTest, ATaskThatWillNotStartHasNoStarts) {
 TEST_F(ComingStartsTest, WhatCannotBeAnsweredIsNamed) {
     ComingStartsRequest request = Stored(10'001);
     EXPECT_EQ(Show(request).status, 2);
-    EXPECT_EQ(Show(request).err, "orvaschedtool: --next shows 1 to 10000 starts\n");
+    EXPECT_EQ(Show(request).err,
+              "orvaschedtool: --next shows 1 to 10000 starts (see orvaschedtool --help)\n");
     request.count = 1;
     request.from = "tomorrow";
     EXPECT_EQ(Show(request).status, 2);
     EXPECT_EQ(Show(request).err,
-              "orvaschedtool: --from needs a UTC instant such as 2027-01-31T12:00:00Z\n");
+              "orvaschedtool: --from needs a UTC instant such as 2027-01-31T12:00:00Z "
+              "(see orvaschedtool --help)\n");
     request.from.clear();
     request.zone = "Europe/Atlantis";
     EXPECT_EQ(Show(request).status, 2);
-    EXPECT_EQ(Show(request).err, "orvaschedtool: --zone: no time zone \"Europe/Atlantis\"\n");
+    EXPECT_EQ(
+        Show(request).err,
+        "orvaschedtool: --zone: no time zone \"Europe/Atlantis\" (see orvaschedtool --help)\n");
     request.zone.clear();
     request.task = 2;
     EXPECT_EQ(Show(request).status, 1);

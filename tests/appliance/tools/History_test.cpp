@@ -85,6 +85,15 @@ TEST_F(HistoryTest, TextShowsARunALine) {
         "nightly: exit status 3\n");
 }
 
+TEST_F(HistoryTest, TextTellsARunThatWasStoppedFromOneThatEndedByItself) {
+    AddRun("task_name, why, signal", "'a', 'stopped', 15");
+    AddRun("task_name, why, exit_status", "'b', 'stopped', 0");
+    AddRun("task_name, state, why", "'c', 'skipped', 'stopped'");
+    EXPECT_THAT(Text(),
+                AllOf(HasSubstr("  a: stopped (signal 15)\n"),
+                      HasSubstr("  b: stopped (exit status 0)\n"), HasSubstr("  c: stopped\n")));
+}
+
 TEST_F(HistoryTest, ControlCharactersDoNotReachTheTerminal) {
     AddRun("task_name, state, why", "'a' || char(27) || 'b', 'skipped', 'c' || char(10) || 'd'");
     EXPECT_THAT(Text(), HasSubstr("a?b: c?d\n"));
@@ -117,6 +126,9 @@ TEST_F(HistoryTest, OutputIsPrintedByteForByteAndWhatIsMissingIsTold) {
     EXPECT_EQ(output(1).status, 0);
     EXPECT_EQ(output(2).out, "");
     EXPECT_EQ(output(2).err, "");
+    Execute("UPDATE run SET state = 'running' WHERE id = 2");
+    EXPECT_EQ(output(2).err, "orvaschedtool: run 2 still goes on\n");
+    EXPECT_EQ(output(2).status, 0);
     EXPECT_EQ(output(3).status, 1);
     EXPECT_EQ(output(3).err, "orvaschedtool: there is no run 3\n");
 }

@@ -35,12 +35,30 @@ TEST(ApiCatalogue, TellsWhatOfAnUnknownMethodIsUnknown) {
     EXPECT_EQ(catalogue.Lookup("Tasks", 2, "delete").function, nullptr);
 }
 
+TEST(ApiCatalogue, TakesNothingOfATableThatAddsToAnothersApi) {
+    ApiCatalogue catalogue = Example();
+    std::string conflict;
+    EXPECT_FALSE(
+        catalogue.Add({{"New", 1, "good", &First}, {"Tasks", 1, "purge", &First}}, conflict));
+    EXPECT_EQ(conflict, "another module has Tasks 1 already");
+    EXPECT_EQ(catalogue.Lookup("New", 1, "good").found, ApiCatalogue::Found::kUnknownApi);
+    EXPECT_EQ(catalogue.Lookup("Tasks", 1, "purge").found, ApiCatalogue::Found::kUnknownMethod);
+}
+
+TEST(ApiCatalogue, TakesAnotherVersionOfAnApiFromAnotherTable) {
+    ApiCatalogue catalogue = Example();
+    std::string conflict;
+    EXPECT_TRUE(catalogue.Add({{"Tasks", 3, "list", &First}}, conflict));
+    EXPECT_EQ(catalogue.Lookup("Tasks", 3, "list").function, &First);
+    EXPECT_EQ(catalogue.Lookup("Tasks", 2, "list").function, &Second);
+}
+
 TEST(ApiCatalogue, TakesNothingOfATableThatRepeatsAMethod) {
     ApiCatalogue catalogue = Example();
     std::string conflict;
     EXPECT_FALSE(
         catalogue.Add({{"New", 1, "good", &First}, {"Tasks", 2, "list", &First}}, conflict));
-    EXPECT_EQ(conflict, "Tasks 2 list");
+    EXPECT_EQ(conflict, "another module has Tasks 2 already");
     EXPECT_EQ(catalogue.Lookup("New", 1, "good").found, ApiCatalogue::Found::kUnknownApi);
     EXPECT_EQ(catalogue.Lookup("Tasks", 2, "list").function, &Second);
 }
@@ -49,7 +67,7 @@ TEST(ApiCatalogue, TakesNothingOfATableThatRepeatsItself) {
     ApiCatalogue catalogue;
     std::string conflict;
     EXPECT_FALSE(catalogue.Add({{"A", 1, "m", &First}, {"A", 1, "m", &Second}}, conflict));
-    EXPECT_EQ(conflict, "A 1 m");
+    EXPECT_EQ(conflict, "another row has A 1 m already");
     EXPECT_EQ(catalogue.Lookup("A", 1, "m").found, ApiCatalogue::Found::kUnknownApi);
 }
 

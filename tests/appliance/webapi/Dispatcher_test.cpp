@@ -6,6 +6,8 @@
 #include <stdexcept>
 #include <string>
 
+#include "appliance/util/CallScope.h"
+
 namespace {
 
 using orva::ApiAnswer;
@@ -27,6 +29,9 @@ void ThrowOdd(ORVA::APIRequest*, ORVA::APIResponse*) { throw 42; }
 void ThrowJson(ORVA::APIRequest* request, ORVA::APIResponse* response) {
     response->SetSuccess(request->GetParam("text", Json::Value("x")).asInt());
 }
+void TellCall(ORVA::APIRequest*, ORVA::APIResponse* response) {
+    response->SetSuccess(Json::Value(Json::UInt64{orva::CallScope::Current()}));
+}
 void SayNothing(ORVA::APIRequest*, ORVA::APIResponse*) {}
 
 class DispatcherTest : public testing::Test {
@@ -34,13 +39,14 @@ class DispatcherTest : public testing::Test {
     DispatcherTest() {
         ::openlog("test", LOG_PERROR, LOG_DAEMON);
         std::string conflict;
-        catalogue.Add({{"Test", 1, "echo", &Echo},
-                       {"Test", 1, "refuse", &Refuse},
-                       {"Test", 1, "throw", &Throw},
-                       {"Test", 1, "throw_odd", &ThrowOdd},
-                       {"Test", 1, "throw_json", &ThrowJson},
-                       {"Test", 1, "say_nothing", &SayNothing}},
-                      conflict);
+        EXPECT_TRUE(catalogue.Add({{"Test", 1, "echo", &Echo},
+                                   {"Test", 1, "refuse", &Refuse},
+                                   {"Test", 1, "throw", &Throw},
+                                   {"Test", 1, "throw_odd", &ThrowOdd},
+                                   {"Test", 1, "throw_json", &ThrowJson},
+                                   {"Test", 1, "tell_call", &TellCall},
+                                   {"Test", 1, "say_nothing", &SayNothing}},
+                                  conflict));
     }
     ~DispatcherTest() override { ::closelog(); }
 
@@ -64,6 +70,14 @@ TEST_F(DispatcherTest, CallsTheMethodWithParametersAndLanguage) {
     EXPECT_EQ(answer.status, 200);
     EXPECT_EQ(WriteAnswer(answer.response), R"({"success":true,"data":{"a":1,"language":"de"}})");
     EXPECT_EQ(log, "");
+}
+
+TEST_F(DispatcherTest, EachMethodRunsInACallOfItsOwn) {
+    const Json::Value first = Call("tell_call", "{}").response.GetDocument();
+    Call("throw", "{}");
+    EXPECT_EQ(orva::CallScope::Current(), 0U);
+    EXPECT_NE(first, Json::Value(Json::UInt64{0}));
+    EXPECT_NE(Call("tell_call", "{}").response.GetDocument(), first);
 }
 
 TEST_F(DispatcherTest, GivesAMethodsErrorAsItIs) {

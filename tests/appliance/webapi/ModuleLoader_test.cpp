@@ -117,7 +117,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Fault{"empty_api", "row 2 of its method table is malformed"},
                     Fault{"empty_method", "row 2 of its method table is malformed"},
                     Fault{"version_zero", "row 2 of its method table is malformed"},
-                    Fault{"repeated", "another module or row has Test.Malformed 1 good already"}),
+                    Fault{"repeated", "another row has Test.Malformed 1 good already"}),
     [](const testing::TestParamInfo<Fault>& fault) { return fault.param.module; });
 
 TEST_F(ModuleLoaderTest, LetsTheFirstNameInByteOrderWin) {
@@ -127,7 +127,18 @@ TEST_F(ModuleLoaderTest, LetsTheFirstNameInByteOrderWin) {
     EXPECT_TRUE(HasMethod(loader, "Test.Malformed", 1, "good"));
     EXPECT_FALSE(HasMethod(loader, "Test.Echo", 2, "large"));
     EXPECT_EQ(log, "test: module " + Directory() +
-                       "/b.so is left out: another module or row has Test.Echo 1 echo already\n");
+                       "/b.so is left out: another module has Test.Echo 1 already\n");
+}
+
+TEST_F(ModuleLoaderTest, LetsNoModuleAddMethodsToAnApiOfAnEarlierOne) {
+    Install("echo", "a.so");
+    Install("intruding", "b.so");
+    const ModuleLoader loader = Load();
+    EXPECT_TRUE(HasMethod(loader, "Test.Echo", 1, "echo"));
+    EXPECT_FALSE(HasMethod(loader, "Test.Echo", 1, "more"));
+    EXPECT_FALSE(HasMethod(loader, "Test.Malformed", 1, "good"));
+    EXPECT_EQ(log, "test: module " + Directory() +
+                       "/b.so is left out: another module has Test.Echo 1 already\n");
 }
 
 TEST_F(ModuleLoaderTest, LeavesOutWhatIsNoLibrary) {
