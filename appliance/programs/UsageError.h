@@ -17,7 +17,7 @@ inline std::string UsageProblem(const CLI::App& app, const CLI::ParseError& erro
     if (!unknown.empty()) {
         return "unknown argument " + QuoteForTerminal(unknown.front());
     }
-    const std::string text = error.what();
+    std::string text = error.what();
     const std::string name = text.substr(0, text.find(':'));
     const CLI::Option* option = app.get_option_no_throw(name);
     if (error.get_name() == "ArgumentMismatch" && option != nullptr) {

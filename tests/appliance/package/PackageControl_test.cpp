@@ -120,9 +120,10 @@ TEST_F(PackageControlTest, AFailedCommandIsReported) {
 TEST_F(PackageControlTest, ACommandThatDoesNotEndIsEnded) {
     Install("p", R"(, "start": "exec sleep 600", "stop": "true", "status": "exec sleep 600")");
     PackageControl::Limits limits;
-    limits.command = std::chrono::milliseconds(10);
     limits.status = std::chrono::milliseconds(10);
-    EXPECT_EQ(Start("p", limits), "failed: its start command: did not end within 1 second");
+    PackageControl::Limits hasty = limits;
+    hasty.command = std::chrono::milliseconds(10);
+    EXPECT_EQ(Start("p", hasty), "failed: its start command: did not end within 1 second");
     EXPECT_EQ(Stop("p", limits), "failed: its status command does not work after its stop");
     PackageControl package("p", limits);
     std::string report;
