@@ -173,10 +173,15 @@ bool TaskSchedulerRecycleHandler::ConvertFromJson_App(const Json::Value& documen
     ORVASchedCTaskSetAppName(&task, "#share:recycle_bin#");
 
     // Enabling happens once, with this save: a later read or save must not find the wish again.
-    Json::Value stored = document["app"];
+    const Json::Value& given = document["app"];
     Json::Value enableRecycle;
-    stored.removeMember(kEnableRecycle, &enableRecycle);
-    const Json::Value& app = stored;
+    Json::Value withoutWish;
+    const bool wishes = given.isObject() && given.isMember(kEnableRecycle);
+    if (wishes) {
+        withoutWish = given;
+        withoutWish.removeMember(kEnableRecycle, &enableRecycle);
+    }
+    const Json::Value& app = wishes ? withoutWish : given;
     ORVASchedCTaskSetAppArgs(&task, WriteJsonText(app).c_str());
 
     const std::string actionValue = TextOf(app[kAction]);

@@ -225,17 +225,23 @@ int TaskStore::Save(const TaskData& task) {
 }
 
 SharedTask TaskStore::Change(const TaskData& base, const TaskData& changed) {
-    const absl::TimeZone zoneNow = zone.Now();
     const absl::Time now = options.clock();
+    // What nobody changes needs not be computed anew; the scheduler follows clock and zone.
+    const bool movesStart =
+        changed.schedule != base.schedule || changed.Has(kEnabled) != base.Has(kEnabled);
     Forget();
     SharedTask stored = Guarded(database, [&] {
         WriteTransaction transaction(database);
         // Read under the write lock: nobody else changes the task from here to the commit.
         std::optional<TaskData> task = ReadTask(*transaction, base.id);
+        std::optional<StartSecond> nextStart;
         if (task) {
             ApplyChange(base, changed, *task);
+            if (movesStart) {
+                nextStart = ComputeNextStart(*task, zone.Now(), now);
+            }
         }
-        if (!task || !UpdateTask(*transaction, *task, ComputeNextStart(*task, zoneNow, now), now)) {
+        if (!task || !UpdateTask(*transaction, *task, nextStart, now)) {
             throw StoreFailure(kErrNotFound, "no task " + std::to_string(base.id));
         }
         transaction.Commit();

@@ -256,7 +256,7 @@ int InsertTask(Connection& connection, const TaskData& task, StartSecond nextSta
     return static_cast<int>(id);
 }
 
-bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart,
+bool UpdateTask(Connection& connection, const TaskData& task, std::optional<StartSecond> nextStart,
                 absl::Time now) {
     {
         Query query = connection.Prepare(kUpdate);
@@ -266,10 +266,10 @@ bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextSt
             return false;
         }
     }
-    {
+    if (nextStart) {
         Query query = connection.Prepare(kMoveStart);
         query->bind(1, task.id);
-        BindStart(*query, 2, nextStart);
+        BindStart(*query, 2, *nextStart);
         query->bind(3, absl::ToUnixSeconds(now));
         query->exec();
     }

@@ -25,10 +25,11 @@ std::vector<SharedTask> ReadAllTasks(Connection& connection, std::vector<Damaged
 // one when that is kNewTaskId.
 int InsertTask(Connection& connection, const TaskData& task, StartSecond nextStart);
 
-// Replaces the stored task with the id of `task`. A next start that has come by `now` stays as it
-// is: the scheduler has not seen it yet and puts it on record. False when there is no such task.
-[[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task, StartSecond nextStart,
-                              absl::Time now);
+// Replaces the stored task with the id of `task`. Its next start stays as it is when there is no
+// `nextStart`, and when it has come by `now`: the scheduler has not seen it yet and puts it on
+// record. False when there is no such task.
+[[nodiscard]] bool UpdateTask(Connection& connection, const TaskData& task,
+                              std::optional<StartSecond> nextStart, absl::Time now);
 
 // Removes the task, and which of its starts are on record; its queued runs count as skipped. False
 // when there is none.

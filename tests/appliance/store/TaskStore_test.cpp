@@ -79,6 +79,32 @@ TEST_F(TaskStoreTest, ACallSeesOneStateOfATaskFromItsFirstLookToItsEnd) {
     EXPECT_EQ(store.Find(task.id)->name, "c");
 }
 
+TEST_F(TaskStoreTest, AChangeComputesTheNextStartAnewWhenItIsOneOfTheSchedule) {
+    TaskStore& store = *TaskStore::Current();
+    TaskData task = SampleTask("a");
+    task.id = store.Save(task);
+    const std::string computed = Stored("SELECT next_start FROM task");
+    // As the scheduler may have set it, by a clock or a zone that is another one now.
+    const std::string other = std::to_string(std::stoll(computed) + 60);
+    SQLite::Database(DatabasePath(), SQLite::OPEN_READWRITE)
+        .exec("UPDATE task SET next_start = " + other);
+    TaskData changed = task;
+    changed.name = "b";
+    changed.command = "true";
+    store.Change(task, changed);
+    EXPECT_EQ(Stored("SELECT next_start FROM task"), other);
+    changed = task;
+    changed.Set(orva::kEnabled, false);
+    store.Change(task, changed);
+    EXPECT_EQ(Stored("SELECT count(*) FROM task WHERE next_start IS NULL"), "1");
+    store.Change(changed, task);
+    EXPECT_EQ(Stored("SELECT next_start FROM task"), computed);
+    changed = task;
+    changed.schedule.firstMinute += 1;
+    store.Change(task, changed);
+    EXPECT_EQ(Stored("SELECT next_start FROM task"), other);
+}
+
 TEST_F(TaskStoreTest, ACallSeesWhatItHasChangedItself) {
     TaskStore& store = *TaskStore::Current();
     TaskData task = SampleTask("a");
