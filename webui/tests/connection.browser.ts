@@ -63,6 +63,7 @@ test('a scheduler that does not run is told, and why nothing starts', async ({
     await expect(app.getByText('The scheduler is not running')).toBeVisible();
     await pick(app, 'Report free space', 'Run now');
     const dialog = app.getByRole('dialog');
+    await expect(dialog).toContainText('The scheduler is not running');
     await dialog.getByRole('button', { name: 'Run now' }).click();
     await expect(dialog).toContainText('(code 4803)');
 });

@@ -195,6 +195,15 @@ test('the address of a task that does not exist says so', async ({ app }) => {
     await expect(rowOf(app, 'Lunch signal')).toBeVisible();
 });
 
+test('a kind of task that does not exist leads back to the list', async ({ app }) => {
+    await app.evaluate(() => {
+        window.location.hash = '#/tasks/new/teapot';
+    });
+    await expect(app.getByText('There is no such kind of task.')).toBeVisible();
+    await app.getByRole('button', { name: 'Back to the tasks' }).click();
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+});
+
 test('a change by another client is told while a task is edited', async ({ app, appliance }) => {
     await app.getByRole('link', { name: 'Lunch signal' }).click();
     await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Mine');
@@ -205,6 +214,42 @@ test('a change by another client is told while a task is edited', async ({ app, 
     await app.getByRole('button', { name: /Load their version/ }).click();
     await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toHaveValue('Theirs');
     await expect(app.getByText('Somebody changed this task meanwhile')).toHaveCount(0);
+});
+
+test('another language of the page is no change of the task that is edited', async ({
+    app,
+    appliance,
+}) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Mine');
+    const read = app.waitForResponse(/\/get\?lang=de/);
+    await app.getByRole('button', { name: 'Language: English' }).click();
+    await app.getByRole('menuitem', { name: 'Deutsch' }).click();
+    await expect(app.getByRole('heading', { name: 'Lunch signal' })).toBeVisible();
+    await read;
+    await expect(app.getByRole('button', { name: 'Speichern' })).toBeVisible();
+    const changed = app.getByText('Jemand hat diese Aufgabe inzwischen geändert');
+    await expect(changed).toHaveCount(0);
+
+    const { data } = await appliance.call('get', { id: 1 });
+    await appliance.call('set', { ...data, name: 'Theirs' });
+    await expect(changed).toBeVisible();
+});
+
+test('signing out with unsaved work asks first', async ({ app }) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    const name = app.getByRole('textbox', { name: 'Name', exact: true });
+    await name.fill('Unsaved');
+    const dialog = app.getByRole('dialog', { name: 'Leave without saving?' });
+    for (let time = 0; time < 2; time += 1) {
+        await app.getByRole('button', { name: 'Sign out' }).click();
+        await dialog.getByRole('button', { name: 'Stay' }).click();
+        await expect(dialog).toHaveCount(0);
+        await expect(name).toHaveValue('Unsaved');
+    }
+    await app.getByRole('button', { name: 'Sign out' }).click();
+    await dialog.getByRole('button', { name: 'Leave' }).click();
+    await expect(app.getByLabel('Access token')).toBeVisible();
 });
 
 test('unsaved work is not left without a question', async ({ app }) => {

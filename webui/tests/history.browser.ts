@@ -29,6 +29,55 @@ test('a running task shows what it prints, and can be stopped', async ({ app, ap
     await expect(app.getByRole('button', { name: 'Stop Count up' })).toHaveCount(0);
 });
 
+test('what a running task prints is followed, unless a person has gone back in it', async ({
+    app,
+    appliance,
+}) => {
+    await appliance.script(
+        'Count up',
+        'seq 100; for i in $(seq 400); do echo line $i; sleep 0.2; done',
+    );
+    await appliance.call('run', { task: [1] });
+    await app.getByRole('link', { name: 'History' }).click();
+    await app.getByRole('button', { name: 'Output of run 1' }).click();
+    const output = app.getByRole('region', { name: 'Output' });
+    const size = () => output.evaluate((box) => box.scrollHeight);
+    const left = () =>
+        output.evaluate((box) => box.scrollHeight - box.scrollTop - box.clientHeight);
+    const grown = async () => {
+        const before = await size();
+        await expect(async () => expect(await size()).toBeGreaterThan(before)).toPass();
+    };
+    await expect(output).toContainText('line 2');
+    expect(await left()).toBeLessThan(2);
+    await grown();
+    expect(await left()).toBeLessThan(2);
+
+    await output.evaluate((box) => box.scrollTo(0, 40));
+    await grown();
+    expect(await output.evaluate((box) => box.scrollTop)).toBe(40);
+
+    await output.evaluate((box) => box.scrollTo(0, box.scrollHeight));
+    await grown();
+    expect(await left()).toBeLessThan(2);
+});
+
+test('a run that was asked to stop says so until it has', async ({ app, appliance }) => {
+    await appliance.script('Stubborn', "trap '' TERM; while true; do sleep 0.1; done");
+    await appliance.call('run', { task: [1] });
+    await app.getByRole('link', { name: 'History' }).click();
+    const result = app.locator('td[data-label="Result"]');
+    await app.getByRole('button', { name: 'Stop Stubborn' }).click();
+    await app.getByRole('dialog').getByRole('button', { name: 'Stop' }).click();
+    await expect(result).toHaveText(/Running\s*Being stopped/);
+    await expect(app.getByRole('button', { name: 'Stop Stubborn' })).toHaveCount(0);
+    await expect(app.getByRole('button', { name: 'Output of run 1' })).toBeFocused();
+    await expect(
+        app.getByRole('img', { name: /^0 succeeded, 0 failed,? and 1 running/ }),
+    ).toBeVisible();
+    await expect(result).toHaveText('Stopped by hand', { timeout: 30_000 });
+});
+
 test.describe('where one run goes on at a time', () => {
     test.use({ settings: 'schedmaxruns="1"\n' });
 
@@ -43,6 +92,7 @@ test.describe('where one run goes on at a time', () => {
         const dialog = app.getByRole('dialog', { name: 'Stop Second?' });
         await expect(dialog).toContainText('It has not started yet');
         await dialog.getByRole('button', { name: 'Stop' }).click();
+        await expect(app.getByText('Second will not start')).toBeVisible();
         await expect(results).toHaveText(['Stopped before it started', 'Running']);
         await expect(app.getByRole('button', { name: /^Stop / })).toHaveCount(1);
         await app.getByRole('button', { name: 'Stop First' }).click();

@@ -1,3 +1,6 @@
+import { writeFileSync } from 'node:fs';
+import { join } from 'node:path';
+
 import type { Page } from '@playwright/test';
 
 import { expect, rowOf, test } from './support/test';
@@ -33,7 +36,7 @@ test('a task is made, switched and deleted with nothing but the keyboard', async
     await app.keyboard.press('Enter');
     await expect(app.getByRole('menuitem', { name: /^Beep/ })).toBeFocused();
     await app.keyboard.press('Enter');
-    await expect(app.getByRole('textbox', { name: 'Name', exact: true })).toBeVisible();
+    await expect(app.getByRole('heading', { name: 'New task: Beep' })).toBeFocused();
 
     await tabTo(app, 'textbox', 'Name');
     await app.keyboard.type('By keys');
@@ -45,6 +48,7 @@ test('a task is made, switched and deleted with nothing but the keyboard', async
     // Enter in a field saves.
     await app.keyboard.press('Enter');
     await expect(rowOf(app, 'By keys')).toContainText('Beep for 3 seconds');
+    await expect(app.getByRole('heading', { name: 'Scheduled tasks' })).toBeFocused();
 
     await tabTo(app, 'switch', 'Enable By keys');
     await app.keyboard.press('Space');
@@ -72,4 +76,49 @@ test('the first stop of the tab key skips to the content', async ({ app }) => {
     await app.keyboard.press('Enter');
     await expect(app.locator('#main')).toBeFocused();
     expect(app.url()).toContain('#/tasks');
+});
+
+test('the focus goes along to the view that is opened', async ({ app }) => {
+    await expect(app.getByRole('heading', { name: 'Scheduled tasks' })).not.toBeFocused();
+    await app.getByRole('link', { name: 'Lunch signal' }).press('Enter');
+    await expect(app.getByRole('heading', { name: 'Edit Lunch signal' })).toBeFocused();
+    await app.evaluate(() => history.back());
+    await expect(app.getByRole('heading', { name: 'Scheduled tasks' })).toBeFocused();
+    await app.getByRole('link', { name: 'History' }).press('Enter');
+    await expect(app.getByRole('heading', { name: 'History' })).toBeFocused();
+});
+
+test.describe('where one run goes on at a time', () => {
+    test.use({ tasks: 'none', settings: 'schedmaxruns="1"\n' });
+
+    test('the focus stays with a run that is stopped, or that ends by itself', async ({
+        app,
+        appliance,
+    }) => {
+        await appliance.script('First', 'until [ -e "$ORVA_ROOT/go" ]; do sleep 0.1; done');
+        await appliance.script('Second', 'echo never');
+        await appliance.call('run', { task: [1, 2] });
+        await app.getByRole('link', { name: 'History' }).press('Enter');
+        await expect(app.locator('td[data-label="Result"]')).toHaveText(['Waiting', 'Running']);
+        const stop = (name: string) => app.getByRole('button', { name: `Stop ${name}` });
+        const toggle = (run: number) => app.getByRole('button', { name: `Output of run ${run}` });
+
+        await stop('Second').press('Enter');
+        await expect(app.getByRole('dialog', { name: 'Stop Second?' })).toBeVisible();
+        await app.keyboard.press('Escape');
+        await expect(stop('Second')).toBeFocused();
+        await stop('Second').press('Enter');
+        await app.getByRole('dialog').getByRole('button', { name: 'Stop' }).press('Enter');
+        await expect(app.getByText('Second will not start')).toBeVisible();
+        await expect(stop('Second')).toHaveCount(0);
+        await expect(toggle(2)).toBeFocused();
+
+        await stop('First').focus();
+        writeFileSync(join(appliance.root, 'go'), '');
+        await expect(stop('First')).toHaveCount(0);
+        await expect(toggle(1)).toBeFocused();
+
+        await app.getByRole('button', { name: 'First', exact: true }).press('Enter');
+        await expect(app.getByRole('heading', { name: 'History of First' })).toBeFocused();
+    });
 });

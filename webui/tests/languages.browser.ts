@@ -8,6 +8,12 @@ test('the page speaks the language that is chosen, at once and from then on', as
     await expect(rowOf(app, 'Lunch signal')).toContainText('Signalton');
     // What the appliance says itself comes in that language too.
     await expect(rowOf(app, 'Back up documents')).toContainText('Lokale Sicherung');
+    await app.getByRole('button', { name: 'Aktionen für Lunch signal' }).click();
+    await app.getByRole('menuitem', { name: 'Löschen' }).click();
+    await expect(app.getByRole('dialog').getByRole('heading')).toHaveText(
+        'Warnung:Diese Aufgabe löschen?',
+    );
+    await app.keyboard.press('Escape');
 
     await app.getByRole('button', { name: 'Sprache: Deutsch' }).click();
     await app.getByRole('menuitem', { name: '日本語' }).click();

@@ -15,6 +15,8 @@ test('the list says what there is to know', async ({ app }) => {
     const row = rowOf(app, 'Lunch signal');
     await expect(row.locator('td[data-label="Kind"]')).toHaveText('Beep');
     await expect(row.locator('td[data-label="Action"]')).toHaveText('Beep for 2 seconds');
+    // A long one is cut, and can be read in full.
+    await expect(row.getByTitle('Beep for 2 seconds', { exact: true })).toBeVisible();
     await expect(row.locator('td[data-label="Next start"]')).toContainText('12:00 PM');
     await expect(row.locator('td[data-label="Last result"]')).toHaveText('Never ran');
     await expect(rowOf(app, 'Rebuild the photo index')).toContainText('Photo index');

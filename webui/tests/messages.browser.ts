@@ -54,6 +54,11 @@ for (const [name, width, height] of [
             await app.getByRole('button', { name: 'Create task' }).click();
             await expect(rowOf(app, 'Covered')).toBeVisible();
             await expect(messages).toContainText('Covered is created');
+            // What it says no longer holds.
+            await expect(messages).not.toContainText('The task could not be saved');
+            await app.unroute('**/set_enable*');
+            await app.getByRole('switch', { name: 'Enable Lunch signal' }).click({ force: true });
+            await expect(messages).not.toContainText('Lunch signal could not be switched');
         });
     });
 }

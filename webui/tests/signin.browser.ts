@@ -98,6 +98,56 @@ test.describe('by TLS', () => {
     });
 });
 
+test('signing out without a connection says that it did not work', async ({ app, appliance }) => {
+    await app.route('**/session', (route) => route.abort());
+    await app.getByRole('button', { name: 'Sign out' }).click();
+    const messages = app.getByRole('list', { name: 'Messages' });
+    await expect(messages).toContainText('You could not be signed out');
+    await expect(messages).toContainText('The appliance cannot be reached.');
+    await expect(rowOf(app, 'Lunch signal')).toBeVisible();
+    // The list goes on following the appliance.
+    await appliance.script('Meanwhile', 'true');
+    await expect(rowOf(app, 'Meanwhile')).toBeVisible();
+
+    await app.unroute('**/session');
+    await app.getByRole('button', { name: 'Sign out' }).click();
+    await expect(app.getByLabel('Access token')).toBeVisible();
+    await expect(messages).not.toContainText('You could not be signed out');
+    await app.reload();
+    await expect(app.getByLabel('Access token')).toBeVisible();
+});
+
+test('signing in in another tab ends the question for the token here', async ({
+    app,
+    appliance,
+}) => {
+    await app.getByRole('link', { name: 'Lunch signal' }).click();
+    const name = app.getByRole('textbox', { name: 'Name', exact: true });
+    await name.fill('Typed before');
+    await app.context().clearCookies();
+    const dialog = app.getByRole('dialog', { name: 'Your session has ended' });
+    await expect(dialog).toBeVisible();
+    const other = await app.context().newPage();
+    await other.goto(appliance.link());
+    await expect(rowOf(other, 'Lunch signal')).toBeVisible();
+    await other.close();
+    await app.bringToFront();
+    await app.evaluate(() => window.dispatchEvent(new Event('focus')));
+    await expect(dialog).toHaveCount(0);
+    await expect(name).toHaveValue('Typed before');
+});
+
+test('the title of the browser is in the language of the page before anybody signs in', async ({
+    page,
+    appliance,
+}) => {
+    await page.goto(appliance.url);
+    await expect(page).toHaveTitle('Sign in · Scheduled tasks');
+    await page.getByRole('button', { name: 'Language: English' }).click();
+    await page.getByRole('menuitem', { name: 'Deutsch' }).click();
+    await expect(page).toHaveTitle('Anmelden · Geplante Aufgaben');
+});
+
 test('when the session ends, what was typed stays', async ({ app, appliance }) => {
     await openNew(app, 'Script');
     await app.getByRole('textbox', { name: 'Name', exact: true }).fill('Half done');

@@ -49,8 +49,8 @@ export interface CleanPreview {
 
 export interface Revision {
     revision: number;
-    /** Whether one is alive; an older appliance tells it with its state only. */
-    scheduler?: boolean;
+    /** Whether one is alive. */
+    scheduler: boolean;
 }
 
 export function listShares(signal?: AbortSignal) {

@@ -38,5 +38,11 @@ export async function isSignedIn(): Promise<boolean> {
 }
 
 export async function signOut(): Promise<void> {
-    await send('session', { method: 'DELETE', headers: { 'Content-Type': 'application/json' } });
+    const response = await send('session', {
+        method: 'DELETE',
+        headers: { 'Content-Type': 'application/json' },
+    });
+    if (!response.ok) {
+        throw errorOf(await readAnswer(response), response.status);
+    }
 }

@@ -141,6 +141,9 @@ export function SignInForm({ onSignedIn, notice, wait: begin = 0 }: Props) {
 
 export function SignInPage(props: Props) {
     const { t } = useTexts();
+    useEffect(() => {
+        document.title = `${t('signin.title')} · ${t('app.title')}`;
+    }, [t]);
     return (
         <main className="orva-signin">
             <div className="orva-signin-preferences">

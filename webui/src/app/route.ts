@@ -56,8 +56,27 @@ function nameEntry(place: number, from: string | null): Entry {
 /** The place of the entry that is shown. */
 let { place } = nameEntry(0, null);
 
+/** Another view is shown whose heading has not had the focus yet. */
+let arriving = false;
+
+/** What tells one view from another: its path, and the task that it is about. */
+function viewOf(fragment: string): string {
+    const { path, query } = parseRoute(fragment);
+    return [...path, query.get('task') ?? ''].join('/');
+}
+
+/** Whether a view was opened since this was asked last. */
+export function takeArrival(): boolean {
+    const arrived = arriving;
+    arriving = false;
+    return arrived;
+}
+
 function follow(): void {
+    const before = viewOf(current);
     current = window.location.hash;
+    // What the page begins with was not come to from anywhere.
+    arriving ||= listeners.size > 0 && viewOf(current) !== before;
     listeners.forEach((listener) => listener());
 }
 
@@ -96,6 +115,15 @@ export function setGuard(next: Guard | null): void {
     guard = next;
 }
 
+/** Goes on at once, or else when unsaved work may be left. */
+export function guarded(goOn: () => void): void {
+    if (guard) {
+        guard(goOn);
+    } else {
+        goOn();
+    }
+}
+
 export function go(target: string): void {
     window.location.hash = target;
 }
@@ -112,13 +140,8 @@ export function replace(target: string): void {
 export function close(target: string): void {
     if (entry()?.from === target) {
         history.back();
-    } else if (guard) {
-        guard(() => {
-            guard = null;
-            replace(target);
-        });
     } else {
-        replace(target);
+        guarded(() => replace(target));
     }
 }
 

@@ -5,7 +5,8 @@ import { isSignedIn, signIn, type SignInResult, signOut } from '../api/session';
 import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
-import { replace, SIGN_IN_LINK } from './route';
+import { useToasts } from '../ui/toasts';
+import { guarded, replace, SIGN_IN_LINK } from './route';
 
 export type SessionState = 'checking' | 'out' | 'in' | 'over';
 
@@ -18,6 +19,9 @@ export interface Session {
     entered(): void;
     leave(): void;
 }
+
+/** What a failed sign-out, and the one that succeeds then, are about. */
+const SIGN_OUT = 'sign out';
 
 /** The one-time code of a sign-in link; it leaves the address bar and the history at once. */
 function takeCode(): string | null {
@@ -36,6 +40,7 @@ async function enterWithLink(): Promise<SignInResult | null> {
 
 export function useSession(): Session {
     const { t } = useTexts();
+    const toasts = useToasts();
     const [state, setState] = useState<SessionState>('checking');
     const [notice, setNotice] = useState('');
     const [wait, setWait] = useState(0);
@@ -80,13 +85,43 @@ export function useSession(): Session {
     // Views stay as they are under the dialog: nothing that was typed is lost.
     useEffect(() => onSignedOut(() => setState((old) => (old === 'in' ? 'over' : old))), []);
 
+    // Another tab, or a sign-in link opened there, lets this one in too.
+    useEffect(() => {
+        if (state !== 'over') {
+            return;
+        }
+        const look = () => {
+            if (!document.hidden) {
+                isSignedIn().then(
+                    (inside) => inside && entered(),
+                    () => undefined,
+                );
+            }
+        };
+        document.addEventListener('visibilitychange', look);
+        window.addEventListener('focus', look);
+        return () => {
+            document.removeEventListener('visibilitychange', look);
+            window.removeEventListener('focus', look);
+        };
+    }, [state, entered]);
+
     const leave = useCallback(() => {
-        live.stop();
-        void signOut().finally(() => {
-            setNotice('');
-            setState('out');
+        guarded(() => {
+            live.stop();
+            signOut().then(
+                () => {
+                    toasts.settle(SIGN_OUT);
+                    setNotice('');
+                    setState('out');
+                },
+                (error: unknown) => {
+                    toasts.fail(t('failed.signOut'), error, SIGN_OUT);
+                    void live.start();
+                },
+            );
         });
-    }, []);
+    }, [t, toasts]);
 
     return {
         state,

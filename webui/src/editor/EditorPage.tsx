@@ -1,4 +1,4 @@
-import { Button, Title } from '@patternfly/react-core';
+import { Button } from '@patternfly/react-core';
 import { useEffect, useState } from 'react';
 
 import { ApiError } from '../api/client';
@@ -10,6 +10,7 @@ import { kindName } from '../tasks/kinds';
 import { lastList } from '../tasks/lastList';
 import { useTexts } from '../texts/TextsProvider';
 import { Failed, Loading } from '../ui/states';
+import { ViewTitle } from '../ui/ViewTitle';
 import { asEditableKind } from './kinds/names';
 import { TaskEditor } from './TaskEditor';
 
@@ -48,14 +49,12 @@ export function EditorPage({ id, kind, onTitle }: Props) {
     useEffect(() => onTitle(title), [onTitle, title]);
 
     if (begin === null) {
-        if (key === null) {
-            return <Failed title={t('editor.failed')} error={new Error(t('editor.unknownKind'))} />;
-        }
-        if (isMissing(query.error)) {
+        // Neither comes into being by trying again.
+        if (key === null || isMissing(query.error)) {
             return (
                 <Failed
                     title={t('editor.failed')}
-                    error={new Error(t('editor.noTask'))}
+                    error={new Error(t(key === null ? 'editor.unknownKind' : 'editor.noTask'))}
                     action={
                         <Button onClick={() => close(lastList())}>{t('editor.back')}</Button>
                     }
@@ -67,7 +66,7 @@ export function EditorPage({ id, kind, onTitle }: Props) {
     }
     return (
         <>
-            <Title headingLevel="h1">{title}</Title>
+            <ViewTitle>{title}</ViewTitle>
             {known && <p className="orva-subtle">{t(`kindHelp.${known}`)}</p>}
             <TaskEditor
                 begin={begin}

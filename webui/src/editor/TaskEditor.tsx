@@ -22,9 +22,13 @@ import { GeneralTab } from './GeneralTab';
 import { kindOf } from './kinds';
 import { type Tab, TABS, tabOf } from './problems';
 import { ScheduleTab } from './ScheduleTab';
+import { storedPart } from './task';
 import { type TaskEditor as Editor, useTaskEditor } from './useTaskEditor';
 import { useUnsaved } from './useUnsaved';
 import { Notice } from '../ui/Notice';
+
+/** What a failed save, and the one that succeeds then, are about. */
+const SAVE = 'save';
 
 interface Props {
     begin: TaskDocument;
@@ -36,13 +40,13 @@ interface Props {
 }
 
 /** Says when the stored task is no longer the one that is being edited. */
-function Meanwhile(props: Pick<Props, 'now' | 'isGone'> & { seen: string; onLoad(): void }) {
+function Meanwhile(props: { isGone: boolean; isChanged: boolean; onLoad(): void }) {
     const { t } = useTexts();
-    const { now, isGone, seen, onLoad } = props;
+    const { isGone, isChanged, onLoad } = props;
     if (isGone) {
         return <Notice variant="warning" title={t('editor.gone')} />;
     }
-    if (!now || JSON.stringify(now) === seen) {
+    if (!isChanged) {
         return null;
     }
     return (
@@ -97,7 +101,8 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
     const toasts = useToasts();
     const kind = useMemo(() => kindOf(begin.type), [begin.type]);
     const editor = useTaskEditor(begin, kind);
-    const [seen, setSeen] = useState(() => JSON.stringify(begin));
+    const [seen, setSeen] = useState(() => storedPart(begin, kind));
+    const stored = useMemo(() => now && storedPart(now, kind), [now, kind]);
     const [saved, setSaved] = useState(false);
     const leaveDialog = useUnsaved(editor.dirty && !saved);
     const { form, tab, refusal } = editor;
@@ -108,11 +113,12 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
             if ((await editor.save()) !== null) {
                 setSaved(true);
                 setGuard(null);
+                toasts.settle(SAVE);
                 toasts.say('success', t(isNew ? 'done.created' : 'done.saved', { name: form.name }));
                 close(lastList());
             }
         } catch (error) {
-            toasts.fail(t('failed.save'), error);
+            toasts.fail(t('failed.save'), error, SAVE);
         }
     };
 
@@ -121,12 +127,11 @@ export function TaskEditor({ begin, isNew, now, isGone }: Props) {
         <FieldsContext value={fields}>
             {!saved && (
                 <Meanwhile
-                    now={now}
                     isGone={isGone}
-                    seen={seen}
+                    isChanged={stored !== null && stored !== seen}
                     onLoad={() => {
                         if (now) {
-                            setSeen(JSON.stringify(now));
+                            setSeen(storedPart(now, kind));
                             editor.load(now);
                         }
                     }}

@@ -3,7 +3,7 @@ import { describe, expect, it } from 'vitest';
 import type { TaskDocument } from '../api/tasks';
 import { beepExtra, beepForm, beepProblems } from './kinds/beep/model';
 import { defineKind } from './kinds/kind';
-import { placeOf, taskChange, taskForm, taskProblems } from './task';
+import { placeOf, storedPart, taskChange, taskForm, taskProblems } from './task';
 
 const BEEP = defineKind({
     toForm: beepForm,
@@ -68,6 +68,15 @@ describe('a task', () => {
     it('of another application gives back its settings as they came', () => {
         const backup = { ...LUNCH, type: 'backup', extra: null };
         expect(taskChange(taskForm(backup, OTHER), backup, OTHER).extra).toBeNull();
+    });
+
+    it('is the same in every language, and another once something of it is stored anew', () => {
+        const before = storedPart(LUNCH, BEEP);
+        expect(storedPart({ ...LUNCH, action: 'Signalton für 2 Sekunden' }, BEEP)).toBe(before);
+        const changes = [{ name: 'Noon' }, { enable: false }, { owner: 'ann' }];
+        for (const change of [...changes, { extra: { beep_duration: 3 } }]) {
+            expect(storedPart({ ...LUNCH, ...change }, BEEP)).not.toBe(before);
+        }
     });
 
     it('tells all that is wrong at once', () => {

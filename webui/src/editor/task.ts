@@ -50,6 +50,11 @@ export function taskChange(form: TaskForm, document: TaskDocument, kind: Kind): 
     };
 }
 
+/** What two versions of a task are compared by: all that is stored, and none of the words about it. */
+export function storedPart(document: TaskDocument, kind: Kind): string {
+    return JSON.stringify(taskChange(taskForm(document, kind), document, kind));
+}
+
 function nameProblem(name: string): Problem | undefined {
     if (name.trim() === '') {
         return { key: 'problem.name' };

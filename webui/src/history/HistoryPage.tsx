@@ -2,7 +2,6 @@ import {
     Button,
     EmptyState,
     EmptyStateBody,
-    Title,
     Toolbar,
     ToolbarContent,
     ToolbarItem,
@@ -20,6 +19,7 @@ import { useTexts } from '../texts/TextsProvider';
 import { Choice } from '../ui/Choice';
 import { Pages } from '../ui/Pages';
 import { Failed, Loading } from '../ui/states';
+import { ViewTitle } from '../ui/ViewTitle';
 import { RunChart } from './RunChart';
 import { RunTable } from './RunTable';
 import { type HistoryView, parseHistory, RUNS_PER_PAGE, showHistory } from './view';
@@ -95,7 +95,7 @@ export function HistoryPage({ onTitle }: ViewProps) {
     }
     return (
         <>
-            <Title headingLevel="h1">{title}</Title>
+            <ViewTitle key={view.task}>{title}</ViewTitle>
             <Toolbar isStatic className="orva-toolbar">
                 <ToolbarContent>
                     <ToolbarItem>

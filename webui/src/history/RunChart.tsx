@@ -7,17 +7,21 @@ const BAR = 10;
 const STEP = 14;
 const LEAST = 3;
 
+/** Told only when there are any. */
+const OTHERS = ['stopped', 'skipped', 'lost', 'running', 'queued'] as const;
+
 /** The runs that stand below, from old to new: how long each took, and how it went. */
 export function RunChart({ runs }: { runs: Run[] }) {
     const { t, format } = useTexts();
     const shown = runs.toReversed().map((run) => ({ run, length: runLength(run, Date.now()) ?? 0 }));
     const longest = Math.max(0, ...shown.map(({ length }) => length));
     const count = (outcome: Outcome) => runs.filter((run) => outcomeOf(run) === outcome).length;
-    const stopped = count('stopped');
     const counts = [
         t.count('chart.good', count('ok')),
         t.count('chart.bad', count('failed')),
-        ...(stopped > 0 ? [t.count('chart.stopped', stopped)] : []),
+        ...OTHERS.filter((outcome) => count(outcome) > 0).map((outcome) =>
+            t.count(`chart.${outcome}`, count(outcome)),
+        ),
     ];
     const summary = t('chart.summary', {
         counts: format.list(counts),

@@ -1,4 +1,4 @@
-import { useEffect, useRef, useState } from 'react';
+import { type UIEvent, useEffect, useLayoutEffect, useRef, useState } from 'react';
 
 import { type Run, runOutput } from '../api/history';
 import { PERIOD, useLive } from '../live/live';
@@ -7,6 +7,9 @@ import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
 import { Loading } from '../ui/states';
 import { Notice } from '../ui/Notice';
+
+/** Pixels from the end that still count as the end: places are rounded. */
+const END = 2;
 
 /** Counts up every two seconds while `active` and the page is seen. */
 function useBeat(active: boolean): number {
@@ -25,9 +28,34 @@ function useBeat(active: boolean): number {
     return beat;
 }
 
-function Text({ text, label }: { text: string; label: string }) {
+interface TextProps {
+    text: string;
+    label: string;
+    /** Whether more may come at the end, which is kept in sight as long as nobody goes back. */
+    follow?: boolean;
+}
+
+function Text({ text, label, follow = false }: TextProps) {
+    const box = useRef<HTMLPreElement>(null);
+    const atEnd = useRef(true);
+    useLayoutEffect(() => {
+        if (follow && atEnd.current && box.current) {
+            box.current.scrollTop = box.current.scrollHeight;
+        }
+    }, [text, follow]);
+    const note = ({ currentTarget }: UIEvent) => {
+        const { scrollHeight, scrollTop, clientHeight } = currentTarget;
+        atEnd.current = scrollHeight - scrollTop - clientHeight < END;
+    };
     return (
-        <pre className="orva-output" tabIndex={0} aria-label={label} role="region">
+        <pre
+            ref={box}
+            className="orva-output"
+            tabIndex={0}
+            aria-label={label}
+            role="region"
+            onScroll={note}
+        >
             {text}
         </pre>
     );
@@ -38,6 +66,8 @@ export function RunDetails({ run }: { run: Run }) {
     const { t, format } = useTexts();
     const { online } = useLive();
     const running = run.state === 'running';
+    // To the last line, which comes when it runs no more.
+    const [follow] = useState(running);
     const beat = useBeat(running && online);
     const { data, error } = useQuery(`${run.run} ${run.state} ${beat}`, (signal) =>
         runOutput(run.run, signal),
@@ -93,10 +123,14 @@ export function RunDetails({ run }: { run: Run }) {
                             <p className="orva-dropped">
                                 {t('history.dropped', { bytes: format.bytes(data.dropped) })}
                             </p>
-                            <Text text={data.tail} label={t('history.tail')} />
+                            <Text text={data.tail} label={t('history.tail')} follow={follow} />
                         </>
                     ) : (
-                        <Text text={data.head + data.tail} label={t('history.output')} />
+                        <Text
+                            text={data.head + data.tail}
+                            label={t('history.output')}
+                            follow={follow}
+                        />
                     )}
                 </>
             )}

@@ -2,11 +2,12 @@ import { Button } from '@patternfly/react-core';
 import { ExpandableRowContent, Table, Tbody, Td, Th, Thead, Tr } from '@patternfly/react-table';
 import AngleDownIcon from '@patternfly/react-icons/dist/esm/icons/angle-down-icon';
 import AngleRightIcon from '@patternfly/react-icons/dist/esm/icons/angle-right-icon';
-import { useState } from 'react';
+import { useLayoutEffect, useRef, useState } from 'react';
 
 import type { Run } from '../api/history';
 import { useNow } from '../live/useNow';
 import { useTexts } from '../texts/TextsProvider';
+import { focusFirst, keepFocus } from '../ui/focus';
 import { reasonText, ResultLabel, runLength } from './result';
 import { RunDetails } from './RunDetails';
 import { StopRun } from './StopRun';
@@ -20,19 +21,62 @@ interface Props {
     onTask(task: number): void;
 }
 
-function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
-    const { run, oneTask, open, onOpen, onTask, onStop } = props;
+function toggleId(run: number): string {
+    return `output-of-${run}`;
+}
+
+function stopId(run: number): string {
+    return `stop-${run}`;
+}
+
+/** It goes when the run ends, whoever is on it. */
+function StopButton({ run, onStop }: { run: Run; onStop(): void }) {
+    const { t } = useTexts();
+    const button = useRef<HTMLButtonElement>(null);
+    useLayoutEffect(() => {
+        const shown = button.current;
+        return () => {
+            if (shown === document.activeElement) {
+                keepFocus([toggleId(run.run)]);
+            }
+        };
+    }, [run.run]);
+    return (
+        <Button
+            id={stopId(run.run)}
+            ref={button}
+            variant="secondary"
+            size="sm"
+            onClick={onStop}
+            aria-label={t('history.stopOf', { name: run.name })}
+        >
+            {t('action.stop')}
+        </Button>
+    );
+}
+
+interface RowProps extends Omit<Props, 'runs'> {
+    run: Run;
+    /** Whether it was asked to stop from here. */
+    isAsked: boolean;
+    onStop(): void;
+}
+
+function RunRow(props: RowProps) {
+    const { run, oneTask, open, isAsked, onOpen, onTask, onStop } = props;
     const { t, format } = useTexts();
     const isOpen = open === run.run;
     const running = run.state === 'running';
     const now = useNow(running);
     const length = runLength(run, now);
-    const why = reasonText(run, t);
+    const stopping = running && isAsked;
+    const why = stopping ? t('history.stopping') : reasonText(run, t);
     return (
         <Tbody isExpanded={isOpen}>
             <Tr>
                 <Td className="pf-v6-c-table__toggle">
                     <Button
+                        id={toggleId(run.run)}
                         variant="plain"
                         aria-expanded={isOpen}
                         aria-label={t('history.outputOf', { run: run.run })}
@@ -63,15 +107,8 @@ function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
                 </Td>
                 <Td dataLabel={t('history.reason')}>{t(`reason.${run.reason}`)}</Td>
                 <Td isActionCell>
-                    {(running || run.state === 'queued') && (
-                        <Button
-                            variant="secondary"
-                            size="sm"
-                            onClick={onStop}
-                            aria-label={t('history.stopOf', { name: run.name })}
-                        >
-                            {t('action.stop')}
-                        </Button>
+                    {(running || run.state === 'queued') && !stopping && (
+                        <StopButton run={run} onStop={onStop} />
                     )}
                 </Td>
             </Tr>
@@ -87,6 +124,16 @@ function RunRow(props: Omit<Props, 'runs'> & { run: Run; onStop(): void }) {
 export function RunTable(props: Props) {
     const { t } = useTexts();
     const [stopping, setStopping] = useState<Run | null>(null);
+    const [asked, setAsked] = useState<ReadonlySet<number>>(new Set());
+
+    const close = (run: Run, done: boolean) => {
+        setStopping(null);
+        if (done) {
+            setAsked((old) => new Set(old).add(run.run));
+        }
+        focusFirst([...(done ? [] : [stopId(run.run)]), toggleId(run.run)]);
+    };
+
     return (
         <>
             <Table
@@ -111,11 +158,12 @@ export function RunTable(props: Props) {
                         key={run.run}
                         {...props}
                         run={run}
+                        isAsked={asked.has(run.run)}
                         onStop={() => setStopping(run)}
                     />
                 ))}
             </Table>
-            {stopping && <StopRun run={stopping} onClose={() => setStopping(null)} />}
+            {stopping && <StopRun run={stopping} onClose={(done) => close(stopping, done)} />}
         </>
     );
 }

@@ -8,7 +8,13 @@ import { errorText } from '../ui/errorText';
 import { useToasts } from '../ui/toasts';
 import { Notice } from '../ui/Notice';
 
-export function StopRun({ run, onClose }: { run: Run; onClose(): void }) {
+interface Props {
+    run: Run;
+    /** Tells whether the run was asked to stop. */
+    onClose(asked: boolean): void;
+}
+
+export function StopRun({ run, onClose }: Props) {
     const { t } = useTexts();
     const toasts = useToasts();
     const [busy, setBusy] = useState(false);
@@ -18,9 +24,12 @@ export function StopRun({ run, onClose }: { run: Run; onClose(): void }) {
         setBusy(true);
         try {
             await stopRun(run.run);
-            toasts.say('info', t('done.stopping', { name: run.name }));
+            toasts.say(
+                'info',
+                t(run.state === 'queued' ? 'done.cancelled' : 'done.stopping', { name: run.name }),
+            );
             live.look();
-            onClose();
+            onClose(true);
         } catch (error) {
             setFailure(errorText(error, t));
             setBusy(false);
@@ -28,7 +37,12 @@ export function StopRun({ run, onClose }: { run: Run; onClose(): void }) {
     };
 
     return (
-        <Modal isOpen variant="small" onEscapePress={onClose} aria-labelledby="stop-title">
+        <Modal
+            isOpen
+            variant="small"
+            onEscapePress={() => onClose(false)}
+            aria-labelledby="stop-title"
+        >
             <ModalHeader title={t('stop.title', { name: run.name })} labelId="stop-title" />
             <ModalBody>
                 {failure && <Notice variant="danger" title={failure} />}
@@ -38,7 +52,7 @@ export function StopRun({ run, onClose }: { run: Run; onClose(): void }) {
                 <Button variant="danger" isLoading={busy} isDisabled={busy} onClick={() => void stop()}>
                     {t('action.stop')}
                 </Button>
-                <Button variant="link" onClick={onClose}>
+                <Button variant="link" onClick={() => onClose(false)}>
                     {t('action.cancel')}
                 </Button>
             </ModalFooter>

@@ -56,8 +56,8 @@ describe('the watch on the appliance', () => {
     it('asks for its state once, and then for the revision every two seconds', async () => {
         await live.start();
         expect(world.asked).toEqual(['info', 'revision']);
-        await vi.advanceTimersByTimeAsync(3 * PERIOD);
-        expect(world.asked).toEqual(['info', 'revision', 'revision', 'revision', 'revision']);
+        await vi.advanceTimersByTimeAsync(40 * PERIOD);
+        expect(world.asked).toEqual(['info', ...Array<string>(41).fill('revision')]);
     });
 
     it('says that something changed when the revision has', async () => {
@@ -79,15 +79,44 @@ describe('the watch on the appliance', () => {
         expect(live.read().info?.scheduler).toBe(true);
     });
 
-    it('believes the state of an appliance whose revision says nothing of the scheduler', async () => {
-        world.revision = { revision: 1 };
-        world.info.scheduler = false;
+    it('asks for the state again when the scheduler has come or gone', async () => {
         await live.start();
-        await vi.advanceTimersByTimeAsync(PERIOD);
-        expect(live.read().info?.scheduler).toBe(false);
-        world.info.scheduler = true;
-        await vi.advanceTimersByTimeAsync(15 * PERIOD);
-        expect(live.read().info?.scheduler).toBe(true);
+        world.revision = { revision: 1, scheduler: false };
+        world.info = { name: 'cellar', scheduler: false, buzzer: false };
+        await vi.advanceTimersByTimeAsync(2 * PERIOD);
+        expect(live.read().info).toEqual({ name: 'cellar', scheduler: false, buzzer: false });
+        world.asked = [];
+        await vi.advanceTimersByTimeAsync(2 * PERIOD);
+        expect(world.asked).toEqual(['revision', 'revision']);
+    });
+
+    it('asks for the state again when the connection is back', async () => {
+        await live.start();
+        world.down = true;
+        await vi.advanceTimersByTimeAsync(2 * PERIOD);
+        world.down = false;
+        world.info.buzzer = true;
+        await vi.advanceTimersByTimeAsync(2 * PERIOD);
+        expect(live.read().info?.buzzer).toBe(true);
+    });
+
+    it('asks for the state until it has it', async () => {
+        world.down = true;
+        await live.start();
+        expect(live.read()).toMatchObject({ online: false, info: null });
+        world.down = false;
+        await vi.advanceTimersByTimeAsync(2 * PERIOD);
+        expect(live.read()).toMatchObject({ online: true, info: { name: 'attic' } });
+    });
+
+    it('sees a change within two seconds, whenever it happens', async () => {
+        await live.start();
+        for (let revision = 2; revision < 40; revision += 1) {
+            const before = live.read().changes;
+            world.revision = { revision, scheduler: true };
+            await vi.advanceTimersByTimeAsync(PERIOD);
+            expect(live.read().changes).toBe(before + 1);
+        }
     });
 
     it('asks nothing while the page is hidden, and at once when it is seen again', async () => {

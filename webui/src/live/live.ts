@@ -5,8 +5,6 @@ import { ConnectionError, isAbort, SignedOutError } from '../api/client';
 
 /** Milliseconds between two requests while nothing happens. */
 export const PERIOD = 2000;
-/** Every so many requests ask for the appliance's state instead of the revision. */
-const INFO_EVERY = 15;
 
 export interface LiveState {
     /** Grows whenever what was read may be out of date: somebody changed something, or the connection is back. */
@@ -28,7 +26,8 @@ export class Live {
     private asking = false;
     private askAgain = false;
     private lastAsked = 0;
-    private count = 0;
+    /** The appliance's state is asked for along with the next revision. */
+    private wantsInfo = true;
 
     readonly subscribe = (listener: () => void): (() => void) => {
         this.listeners.add(listener);
@@ -44,7 +43,7 @@ export class Live {
         }
         this.running = true;
         document.addEventListener('visibilitychange', this.onVisibility);
-        await this.askForInfo();
+        this.wantsInfo = true;
         await this.ask();
     }
 
@@ -78,18 +77,7 @@ export class Live {
     private schedule(delay: number): void {
         clearTimeout(this.timer);
         if (this.running && !document.hidden) {
-            this.timer = setTimeout(() => void this.tick(), delay);
-        }
-    }
-
-    private async tick(): Promise<void> {
-        this.count += 1;
-        if (this.count % INFO_EVERY === 0 && this.state.online) {
-            this.lastAsked = Date.now();
-            await this.askForInfo();
-            this.schedule(PERIOD);
-        } else {
-            await this.ask();
+            this.timer = setTimeout(() => void this.ask(), delay);
         }
     }
 
@@ -97,12 +85,15 @@ export class Live {
         this.asking = true;
         this.lastAsked = Date.now();
         clearTimeout(this.timer);
+        const informed = this.wantsInfo ? this.askForInfo() : null;
         try {
             const { revision, scheduler } = await readRevision();
+            await informed;
             const changed = this.revision !== null && this.revision !== revision;
             this.revision = revision;
             const { info } = this.state;
-            if (info && scheduler !== undefined) {
+            if (info && info.scheduler !== scheduler) {
+                this.wantsInfo = true;
                 this.update({ info: { ...info, scheduler } });
             }
             this.answered(changed);
@@ -121,6 +112,7 @@ export class Live {
     private async askForInfo(): Promise<void> {
         try {
             this.update({ info: await readInfo() });
+            this.wantsInfo = false;
         } catch (error) {
             this.failed(error);
         }
@@ -128,6 +120,9 @@ export class Live {
 
     private answered(changed: boolean): void {
         const back = !this.state.online;
+        if (back) {
+            this.wantsInfo = true;
+        }
         if (changed || back) {
             this.update({ online: true, changes: this.state.changes + 1 });
         }

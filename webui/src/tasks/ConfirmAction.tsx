@@ -8,7 +8,7 @@ import {
 import { useState } from 'react';
 
 import type { TaskRow } from '../api/tasks';
-import { live } from '../live/live';
+import { live, useLive } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from '../ui/errorText';
 import { useToasts } from '../ui/toasts';
@@ -47,6 +47,7 @@ function Names({ rows, label }: { rows: TaskRow[]; label: string }) {
 export function ConfirmAction({ action, rows, onClose }: Props) {
     const { t } = useTexts();
     const toasts = useToasts();
+    const { info } = useLive();
     const [busy, setBusy] = useState(false);
     const [failure, setFailure] = useState('');
     const able = rows.filter((row) => allows(action, row));
@@ -79,10 +80,16 @@ export function ConfirmAction({ action, rows, onClose }: Props) {
             <ModalHeader
                 title={t.count(`confirm.${action}`, able.length)}
                 titleIconVariant={action === 'delete' ? 'warning' : undefined}
+                titleScreenReaderText={action === 'delete' ? t('alert.warning') : undefined}
                 labelId="confirm-title"
             />
             <ModalBody id="confirm-body">
                 {failure && <Notice variant="danger" title={failure} />}
+                {action === 'run' && info?.scheduler === false && (
+                    <Notice variant="warning" title={t('notice.noScheduler')}>
+                        {t('notice.noSchedulerBody')}
+                    </Notice>
+                )}
                 {action === 'run' && able.some((row) => row.type === 'beep') && <NoBuzzer />}
                 {able.length > 0 && (
                     <Names rows={able} label={t.count(`confirm.${action}`, able.length)} />

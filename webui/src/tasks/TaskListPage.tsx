@@ -1,4 +1,3 @@
-import { Title } from '@patternfly/react-core';
 import { useEffect, useMemo } from 'react';
 
 import { latestRuns } from '../api/history';
@@ -9,6 +8,7 @@ import { useQuery } from '../live/useQuery';
 import { useTexts } from '../texts/TextsProvider';
 import { Pages } from '../ui/Pages';
 import { Failed, Loading } from '../ui/states';
+import { ViewTitle } from '../ui/ViewTitle';
 import { ConfirmAction } from './ConfirmAction';
 import { rememberList } from './lastList';
 import { NoMatch, NoTasks } from './EmptyList';
@@ -76,7 +76,7 @@ export function TaskListPage({ onTitle }: ViewProps) {
     return (
         <>
             <div className="orva-head">
-                <Title headingLevel="h1">{t('list.title')}</Title>
+                <ViewTitle>{t('list.title')}</ViewTitle>
                 {list.all > 0 && <NewTask />}
             </div>
             {list.all === 0 ? (

@@ -85,7 +85,7 @@ function RowCells(props: TaskTableProps & { row: TaskRow }) {
                 <KindLabel row={row} />
             </Td>
             <Td {...label('list.action')} modifier="breakWord">
-                <span className="orva-clamp">{row.action}</span>
+                <span className="orva-clamp" title={row.action}>{row.action}</span>
             </Td>
             <Td {...label('list.next')}>
                 <NextStart text={row.next_trigger_time} />

@@ -3,6 +3,7 @@ import { useState } from 'react';
 import { enableTasks, listTasks, type TaskRow } from '../api/tasks';
 import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
+import { focusFirst } from '../ui/focus';
 import { useToasts } from '../ui/toasts';
 import { type Action, concerns } from './actions';
 import type { Request } from './ConfirmAction';
@@ -21,12 +22,7 @@ function focusAfter(request: Request, done: boolean): void {
     const [row, ...more] = request.rows;
     const stays = !done || request.action !== 'delete';
     const origin = row && more.length === 0 && stays ? [actionsId(row.id)] : [];
-    setTimeout(() => {
-        [...origin, BULK_ID, 'main']
-            .map((id) => document.getElementById(id))
-            .find((element) => element && !element.matches(':disabled'))
-            ?.focus();
-    });
+    focusFirst([...origin, BULK_ID]);
 }
 
 /** What the list does with tasks: asking first where it matters. */
@@ -78,15 +74,17 @@ export function useTaskActions(view: TaskView, selection: Selection) {
     };
 
     const switchTask = async (row: TaskRow, enable: boolean) => {
+        const about = `switch ${row.id}`;
         setPendingOf(row.id, enable);
         try {
             await enableTasks([row.id], enable);
+            toasts.settle(about);
             live.look();
             // Until the row says so itself.
             setTimeout(() => setPendingOf(row.id, null), 1000);
         } catch (error) {
             setPendingOf(row.id, null);
-            toasts.fail(t('failed.switch', { name: row.name }), error);
+            toasts.fail(t('failed.switch', { name: row.name }), error, about);
         }
     };
 

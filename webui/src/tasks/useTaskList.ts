@@ -15,8 +15,6 @@ export interface TaskListData {
     all: number;
     loaded: boolean;
     error: Error | null;
-    /** All rows that match, when they are at hand. */
-    everything: TaskRow[] | null;
 }
 
 /**
@@ -53,7 +51,6 @@ export function useTaskList(view: TaskView): TaskListData {
         all: query.data?.total ?? 0,
         loaded: query.data !== null,
         error: query.error,
-        everything: matches,
     };
 }
 

@@ -10,12 +10,19 @@ interface Toast {
     variant: 'success' | 'danger' | 'info' | 'warning';
     title: string;
     body?: string;
+    /** What was tried, of a failure. */
+    about?: string;
 }
 
 interface Toasts {
     say(variant: 'success' | 'info' | 'warning', title: string): void;
-    /** A failure stays until it is closed; the end of a session is told elsewhere. */
-    fail(title: string, error: unknown): void;
+    /**
+     * A failure stays until it is closed, or until what was tried, `about`, is settled. The end of a
+     * session is told elsewhere.
+     */
+    fail(title: string, error: unknown, about?: string): void;
+    /** It has worked now. */
+    settle(about: string): void;
 }
 
 const Context = createContext<Toasts | null>(null);
@@ -50,11 +57,12 @@ export function ToastsProvider({ children }: { children: ReactNode }) {
     const value = useMemo<Toasts>(
         () => ({
             say: (variant, title) => add({ variant, title }),
-            fail: (title, error) => {
+            fail: (title, error, about) => {
                 if (!(error instanceof SignedOutError)) {
-                    add({ variant: 'danger', title, body: errorText(error, t) });
+                    add({ variant: 'danger', title, body: errorText(error, t), about });
                 }
             },
+            settle: (about) => setToasts((old) => old.filter((toast) => toast.about !== about)),
         }),
         [add, t],
     );
