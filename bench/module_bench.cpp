@@ -171,7 +171,7 @@ void Delete_floor(benchmark::State& state) {
                           "INSERT INTO task SELECT NULL, flags, name, owner, app, app_name,"
                           " app_args, action, command, edit_form, mode, repeat, week_days,"
                           " date, first_minute, interval_minutes, last_minute, run_missed,"
-                          " next_start FROM task WHERE id = 1");
+                          " next_start, schedule_since FROM task WHERE id = 1");
     RawTransaction transaction(raw, {"DELETE FROM task WHERE id = ?",
                                      "UPDATE run SET state = 'skipped', why = 'deleted' "
                                      "WHERE task = ? AND state = 'queued'",
