@@ -9,8 +9,6 @@
 #include <memory>
 #include <string>
 
-#include "platform/conf.h"
-
 namespace ORVA::ZUM {
 
 // Finds the separately installed applications that bring texts of their own.
@@ -27,7 +25,6 @@ class JSConfigParser {
     Json::Value GetTexts() const;
 
   private:
-    OrvaConf conf;
     std::string language;
     Json::Value texts;
 };

@@ -33,7 +33,7 @@ TEST_F(AppParserTest, ReadsTheCommonTextsOfItsLanguageOnce) {
     EXPECT_EQ(parser.GetString("", "#common:run#"), "Run");
     EXPECT_EQ(parser.GetString("", "#common:run#"), "Run");
     EXPECT_THAT(platform.TextsJournal(),
-                ElementsAre("OrvaConf()", "JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
+                ElementsAre("JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
                             "JSConfigParser::GetTexts()",
                             "ParseTexts(\"/usr/orva/orvaman/webman/texts/enu\")"));
 }

@@ -112,7 +112,7 @@ TEST_F(TranslateActionKeyTest, AsksForNothingWhenTheActionHoldsNoKey) {
         platform.ClearJournal();
         EXPECT_EQ(Action(action, "com.example.Notes"), action);
         EXPECT_THAT(platform.TextsJournal(),
-                    ElementsAre("OrvaConf()", "JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
+                    ElementsAre("JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
                                 "JSConfigParser::GetTexts()",
                                 "ParseTexts(\"/usr/orva/orvaman/webman/texts/enu\")"))
             << action;
@@ -125,7 +125,7 @@ TEST_F(TranslateActionKeyTest, AsksForEveryOccurrenceOfAKeyOfTheOwningApplicatio
         fakes::Document(R"({"a": {"b": "note"}, "": {"": "nothing"}})");
     EXPECT_EQ(Action("#a:b# #a:b# #c:d# #:#", "com.example.Notes"), "note note CD nothing");
     EXPECT_THAT(platform.TextsJournal(),
-                ElementsAre("OrvaConf()", "JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
+                ElementsAre("JSConfigParser(\"enu\")", "JSConfigParser::Parse()",
                             "JSConfigParser::GetTexts()",
                             "ParseTexts(\"/usr/orva/orvaman/webman/texts/enu\")",
                             "ParseTexts(\"/usr/orva/orvaman/webman/apps/notes\")",

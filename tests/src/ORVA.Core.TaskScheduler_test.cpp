@@ -21,7 +21,7 @@ TEST_F(HandlerTest, ReadsTheTextsOfTheRequestsLanguage) {
     ORVA::APIRequest german(Json::Value(Json::objectValue), "ger");
     const TaskSchedulerHandler handler(&german, &response);
     EXPECT_THAT(platform.TextsJournal(),
-                ElementsAre("OrvaConf()", "JSConfigParser(\"ger\")", "JSConfigParser::Parse()",
+                ElementsAre("JSConfigParser(\"ger\")", "JSConfigParser::Parse()",
                             "JSConfigParser::GetTexts()",
                             "ParseTexts(\"/usr/orva/orvaman/webman/texts/ger\")"));
     EXPECT_EQ(fakes::Answer(response), "nothing");
