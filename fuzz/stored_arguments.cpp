@@ -1,9 +1,11 @@
 // Application arguments that a task holds already, from an older version or a damaged store: the
 // first byte chooses the task's kind, "1" to "5", the rest is the text.
 #include <json/reader.h>
+#include <json/writer.h>
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 
 #include "appliance/util/StrictJson.h"
@@ -19,7 +21,7 @@ void SetAgain(const FilledPlatform& platform, const Json::Value& parameters) {
     Require(Call(platform, "set", parameters).Succeeded(), "what was accepted once is again");
 }
 
-void ExpectPlainReadingToBeRight(const std::string& text) {
+void ExpectPlainFormToBeRight(const std::string& text) {
     Json::Value plain;
     if (!ReadPlainJson(text, {}, plain)) {
         return;
@@ -29,6 +31,9 @@ void ExpectPlainReadingToBeRight(const std::string& text) {
     Json::Value ordinary;
     Require(Json::Reader().parse(text, ordinary) && plain == ordinary,
             "what is read quickly is read rightly");
+    const std::optional<std::string> written = WritePlainJson(plain);
+    Require(!written || *written == Json::FastWriter().write(plain),
+            "what is written quickly is written rightly");
 #pragma GCC diagnostic pop
 }
 
@@ -42,7 +47,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string bytes(reinterpret_cast<const char*>(data) + 1, size - 1);
     // The store's texts end at a NUL.
     const std::string text = bytes.substr(0, bytes.find('\0'));
-    ExpectPlainReadingToBeRight(text);
+    ExpectPlainFormToBeRight(text);
     FilledPlatform platform;
     platform.tasks[id].appArgs = text;
 

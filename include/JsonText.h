@@ -1,6 +1,6 @@
-// Application sections as compact JSON text, in the form that task records hold: the
-// writer ends its text with a newline, the reader keeps comments. Both use jsoncpp's older reader
-// and writer, whose output stored tasks depend on.
+// Application sections as compact JSON text, in the form that task records hold: the writer ends
+// its text with a newline, the reader keeps comments. Both yield what jsoncpp's older reader and
+// writer yield, which stored tasks depend on.
 #pragma once
 
 #include <json/value.h>

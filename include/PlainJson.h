@@ -1,9 +1,12 @@
-// A quick reader for what sections nearly always are: JSON that this system's own writer wrote.
+// A quick reader and writer for what sections nearly always are: small trees of plain texts and
+// integers. Reading and writing one is else the larger part of what changing a task computes.
 #pragma once
 
 #include <json/value.h>
 
+#include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 
 // Parses `text` into `value` when it is plain: an object or array, nested at most 32 levels deep,
@@ -15,3 +18,9 @@
 [[nodiscard]] bool ReadPlainJson(std::string_view text,
                                  std::span<const Json::StaticString> frequentNames,
                                  Json::Value& value);
+
+// Writes `value` when it is plain: nested at most 32 levels deep, without holes in arrays, of
+// integers, booleans, nulls, and texts whose bytes are ASCII and stand for themselves in JSON. The
+// text equals that of jsoncpp's older writer, the newline at its end included. None for every other
+// value.
+[[nodiscard]] std::optional<std::string> WritePlainJson(const Json::Value& value);

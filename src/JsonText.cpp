@@ -3,11 +3,19 @@
 #include <json/reader.h>
 #include <json/writer.h>
 
+#include <optional>
+#include <utility>
+
 #include "include/PlainJson.h"
 
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
 
-std::string WriteJsonText(const Json::Value& value) { return Json::FastWriter().write(value); }
+std::string WriteJsonText(const Json::Value& value) {
+    if (std::optional<std::string> text = WritePlainJson(value)) {
+        return *std::move(text);
+    }
+    return Json::FastWriter().write(value);
+}
 
 bool ParseJsonText(const std::string& text, Json::Value& value,
                    std::span<const Json::StaticString> frequentNames) {

@@ -1,5 +1,7 @@
 #include "include/PlainJson.h"
 
+#include <array>
+#include <charconv>
 #include <cstddef>
 #include <cstring>
 #include <string>
@@ -234,6 +236,108 @@ class PlainReader {
     std::string unescaped;
 };
 
+// Each function appends one piece; false when it is not plain.
+class PlainWriter {
+  public:
+    explicit PlainWriter(std::string& appendedTo) : text(appendedTo) {}
+
+    bool Value(const Json::Value& value, int level) {
+        switch (value.type()) {
+            case Json::objectValue:
+                return Object(value, level + 1);
+            case Json::arrayValue:
+                return Array(value, level + 1);
+            case Json::stringValue: {
+                const char* first = nullptr;
+                const char* end = nullptr;
+                return value.getString(&first, &end) && Text(first, end);
+            }
+            case Json::intValue:
+                return Integer(value.asLargestInt());
+            case Json::uintValue:
+                return Integer(value.asLargestUInt());
+            case Json::booleanValue:
+                text += value.asBool() ? "true" : "false";
+                return true;
+            case Json::nullValue:
+                text += "null";
+                return true;
+            default:
+                return false;
+        }
+    }
+
+  private:
+    bool Object(const Json::Value& value, int level) {
+        if (level > kMostLevels) {
+            return false;
+        }
+        text += '{';
+        bool isFirst = true;
+        for (auto member = value.begin(); member != value.end(); ++member) {
+            const char* end = nullptr;
+            const char* const name = member.memberName(&end);
+            Separate(isFirst);
+            if (!Text(name, end)) {
+                return false;
+            }
+            text += ':';
+            if (!Value(*member, level)) {
+                return false;
+            }
+        }
+        text += '}';
+        return true;
+    }
+
+    bool Array(const Json::Value& value, int level) {
+        if (level > kMostLevels) {
+            return false;
+        }
+        text += '[';
+        bool isFirst = true;
+        Json::ArrayIndex expected = 0;
+        for (auto element = value.begin(); element != value.end(); ++element) {
+            Separate(isFirst);
+            // An array may have holes.
+            if (element.index() != expected++ || !Value(*element, level)) {
+                return false;
+            }
+        }
+        text += ']';
+        return true;
+    }
+
+    void Separate(bool& isFirst) {
+        if (!isFirst) {
+            text += ',';
+        }
+        isFirst = false;
+    }
+
+    bool Text(const char* first, const char* end) {
+        text += '"';
+        for (const char* at = first; at != end; ++at) {
+            if (*at < ' ' || *at > '~' || *at == '"' || *at == '\\') {
+                return false;
+            }
+        }
+        text.append(first, static_cast<std::size_t>(end - first));
+        text += '"';
+        return true;
+    }
+
+    template <class Number>
+    bool Integer(Number number) {
+        std::array<char, 24> digits{};
+        const auto written = std::to_chars(digits.begin(), digits.end(), number);
+        text.append(digits.data(), written.ptr);
+        return true;
+    }
+
+    std::string& text;
+};
+
 }  // namespace
 
 bool ReadPlainJson(std::string_view text, std::span<const Json::StaticString> frequentNames,
@@ -244,4 +348,16 @@ bool ReadPlainJson(std::string_view text, std::span<const Json::StaticString> fr
     }
     value = std::move(read);
     return true;
+}
+
+std::optional<std::string> WritePlainJson(const Json::Value& value) {
+    // Few sections are longer.
+    constexpr std::size_t kUsualLength = 512;
+    std::string text;
+    text.reserve(kUsualLength);
+    if (!PlainWriter(text).Value(value, 0)) {
+        return std::nullopt;
+    }
+    text += '\n';
+    return text;
 }

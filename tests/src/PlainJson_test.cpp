@@ -50,6 +50,8 @@ void ExpectSameAsOrdinary(const std::string& text) {
     EXPECT_EQ(Json::FastWriter().write(*plain), Json::FastWriter().write(*ordinary)) << text;
 }
 
+std::string OrdinaryText(const Json::Value& value) { return Json::FastWriter().write(value); }
+
 #pragma GCC diagnostic pop
 
 TEST(PlainJsonTest, ReadsAStoredSection) {
@@ -190,6 +192,106 @@ TEST(PlainJsonTest, AgreesWithTheOrdinaryReaderOnWhateverItTakes) {
         }
     }
     EXPECT_GT(taken, 10'000U);
+}
+
+Json::Value Leaf(std::mt19937& random) {
+    constexpr std::string_view kBytes = "abc /~ XYZ019{}[]:,'";
+    switch (random() % 6) {
+        case 0:
+            return static_cast<int>(random());
+        case 1:
+            return static_cast<Json::Value::UInt64>(random()) << (random() % 32);
+        case 2:
+            return random() % 2 == 0;
+        case 3:
+            return {};
+        default: {
+            std::string text(random() % 12, ' ');
+            for (char& byte : text) {
+                byte = random() % 40 == 0 ? static_cast<char>(random())
+                                          : kBytes[random() % kBytes.size()];
+            }
+            return text;
+        }
+    }
+}
+
+Json::Value Tree(std::mt19937& random, int levels) {
+    if (levels == 0 || random() % 3 == 0) {
+        return Leaf(random);
+    }
+    Json::Value tree(random() % 2 == 0 ? Json::arrayValue : Json::objectValue);
+    for (auto count = random() % 5; count-- > 0;) {
+        if (tree.isArray()) {
+            tree.append(Tree(random, levels - 1));
+        } else {
+            const std::string end = random() % 50 == 0 ? "\n" : "";
+            tree["name" + end + std::to_string(random() % 9)] = Tree(random, levels - 1);
+        }
+    }
+    return tree;
+}
+
+TEST(PlainJsonTest, WritesASection) {
+    Json::Value section;
+    section["beep_duration"] = 30;
+    section["b"]["shares"].append("home");
+    section["b"]["shares"].append("a b");
+    section["b"]["none"] = Json::arrayValue;
+    section["b"]["empty"] = Json::objectValue;
+    section["all"] = true;
+    section["not"] = false;
+    section["null"] = Json::nullValue;
+    section["text"] = "";
+    section["slash"] = "/usr/~'";
+    EXPECT_EQ(WritePlainJson(section),
+              "{\"all\":true,\"b\":{\"empty\":{},\"none\":[],\"shares\":[\"home\",\"a b\"]},"
+              "\"beep_duration\":30,\"not\":false,\"null\":null,\"slash\":\"/usr/~'\","
+              "\"text\":\"\"}\n");
+}
+
+TEST(PlainJsonTest, WritesTheOutermostIntegers) {
+    EXPECT_EQ(WritePlainJson(Json::Value::minLargestInt), "-9223372036854775808\n");
+    EXPECT_EQ(WritePlainJson(Json::Value::maxLargestUInt), "18446744073709551615\n");
+}
+
+TEST(PlainJsonTest, LeavesOtherValuesToTheOrdinaryWriter) {
+    Json::Value hole(Json::arrayValue);
+    hole[1] = 1;
+    Json::Value name(Json::objectValue);
+    name["\""] = 1;
+    for (const Json::Value& value :
+         {Json::Value(1.5), Json::Value("\""), Json::Value("\\"), Json::Value("\n"),
+          Json::Value("\x7F"), Json::Value("\xC3\xA4"), Json::Value(std::string("\0", 1)), hole,
+          name}) {
+        EXPECT_EQ(WritePlainJson(value), std::nullopt) << value;
+    }
+}
+
+TEST(PlainJsonTest, WritesThirtyTwoLevels) {
+    Json::Value nested = 1;
+    for (int level = 0; level < 32; ++level) {
+        Json::Value outer(Json::arrayValue);
+        outer.append(nested);
+        nested = outer;
+    }
+    EXPECT_EQ(WritePlainJson(nested), OrdinaryText(nested));
+    Json::Value outer(Json::objectValue);
+    outer["a"] = nested;
+    EXPECT_EQ(WritePlainJson(outer), std::nullopt);
+}
+
+TEST(PlainJsonTest, WritesWhatTheOrdinaryWriterWrites) {
+    std::mt19937 random(20261121);
+    std::size_t taken = 0;
+    for (int round = 0; round < 10'000; ++round) {
+        const Json::Value tree = Tree(random, 4);
+        if (const std::optional<std::string> text = WritePlainJson(tree)) {
+            ++taken;
+            EXPECT_EQ(*text, OrdinaryText(tree));
+        }
+    }
+    EXPECT_GT(taken, 4'000U);
 }
 
 }  // namespace
