@@ -1,5 +1,6 @@
 #include "tests/appliance/store/StoreTest.h"
 
+#include <SQLiteCpp/SQLiteCpp.h>
 #include <sched.h>
 #include <sys/mount.h>
 #include <sys/wait.h>
@@ -50,6 +51,11 @@ orva::TaskStore::Options StoreTest::Options(std::chrono::milliseconds busyTimeou
     return {busyTimeout, [now = nowSecond] { return absl::FromUnixSeconds(*now); }};
 }
 
+std::string StoreTest::Stored(const std::string& sql) const {
+    SQLite::Database database(DatabasePath());
+    return database.execAndGet(sql).getString();
+}
+
 void StoreTest::Reopen(std::chrono::milliseconds busyTimeout) {
     orva::TaskStore::Configure(Options(busyTimeout));
 }
@@ -75,6 +81,14 @@ orva::TaskData StoreTest::SampleTask(const std::string& name) {
     task.command = "true";
     task.schedule.firstMinute = 6 * 60 + 30;
     return task;
+}
+
+std::vector<int> StoreTest::Ids(const orva::Snapshot& snapshot) {
+    std::vector<int> ids;
+    for (const orva::SharedTask& task : snapshot.Tasks()) {
+        ids.push_back(task->id);
+    }
+    return ids;
 }
 
 std::string InOwnMounts(const std::function<std::string()>& work) {

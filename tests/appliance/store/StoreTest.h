@@ -8,6 +8,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "appliance/store/TaskStore.h"
 #include "platform/schedtask.h"
@@ -22,6 +23,8 @@ class StoreTest : public Sandbox {
 
     // The database file.
     std::string DatabasePath() const;
+    // The one column of the one row that the query finds.
+    std::string Stored(const std::string& sql) const;
     // Lets go of the store; the next use opens it anew, with that patience.
     void Reopen(std::chrono::milliseconds busyTimeout = std::chrono::seconds(30));
     // A second store on the same database, which knows nothing of the first: what another process
@@ -31,6 +34,7 @@ class StoreTest : public Sandbox {
 
     // A complete task that starts daily at 06:30.
     static orva::TaskData SampleTask(const std::string& name);
+    static std::vector<int> Ids(const orva::Snapshot& snapshot);
 
   private:
     orva::TaskStore::Options Options(std::chrono::milliseconds busyTimeout);
