@@ -138,22 +138,21 @@ TEST(SchedulerFullDiskTest, NothingIsLostAndStartsAreMadeWhenThereIsSpaceAgain) 
 }
 
 TEST(SchedulerFullDiskTest, AStartWhoseOutputHasNoSpaceEndsWithThat) {
-    EXPECT_EQ(InOwnMounts([]() -> std::string {
-                  SmallDisk disk;
-                  if (const std::string problem = disk.MakeDueAfter(TakeAllNodes);
-                      !problem.empty()) {
-                      return problem;
-                  }
-                  if (!WaitFor([&] {
-                          const auto runs =
-                              orva::RunStore::Current()->List({disk.due, {}}, 0, 1).runs;
-                          return !runs.empty() && runs.front().state == RunState::kEnded;
-                      })) {
-                      return "does not end";
-                  }
-                  return disk.EndTheFirstRun() ? disk.GiveSpace() : "has no space for the ending";
-              }),
-              "ended 7 early\nlate\n/ ended no space for output / ok / 0");
+    EXPECT_EQ(
+        InOwnMounts([]() -> std::string {
+            SmallDisk disk;
+            if (const std::string problem = disk.MakeDueAfter(TakeAllNodes); !problem.empty()) {
+                return problem;
+            }
+            if (!WaitFor([&] {
+                    const auto runs = orva::RunStore::Current()->List({disk.due, {}}, 0, 1).runs;
+                    return !runs.empty() && runs.front().state == RunState::kEnded;
+                })) {
+                return "does not end";
+            }
+            return disk.EndTheFirstRun() ? disk.GiveSpace() : "has no space for the ending";
+        }),
+        "ended 7 early\nlate\n/ ended no space for output / ok / 0");
 }
 
 }  // namespace
