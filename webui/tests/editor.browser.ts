@@ -190,6 +190,8 @@ test('the address of a task that does not exist says so', async ({ app }) => {
     await app.evaluate(() => {
         window.location.hash = '#/tasks/4711';
     });
+    const heading = app.getByRole('heading', { level: 1 });
+    await expect(heading.getByText('The task could not be read')).toBeFocused();
     await expect(app.getByText('There is no such task, or not any more.')).toBeVisible();
     await app.getByRole('button', { name: 'Back to the tasks' }).click();
     await expect(rowOf(app, 'Lunch signal')).toBeVisible();

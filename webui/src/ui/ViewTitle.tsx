@@ -3,17 +3,20 @@ import { useEffect, useRef } from 'react';
 
 import { takeArrival } from '../app/route';
 
-/**
- * The heading of a view. It takes the focus when the view is opened: it is read out, and Tab goes on
- * from there.
- */
-export function ViewTitle({ children }: { children: string }) {
-    const title = useRef<HTMLHeadingElement>(null);
+/** What takes the focus when its view is opened: it is read out, and Tab goes on from there. */
+export function useArrival<Element extends HTMLElement>() {
+    const element = useRef<Element>(null);
     useEffect(() => {
         if (takeArrival()) {
-            title.current?.focus();
+            element.current?.focus();
         }
     }, []);
+    return element;
+}
+
+/** The heading of a view. */
+export function ViewTitle({ children }: { children: string }) {
+    const title = useArrival<HTMLHeadingElement>();
     return (
         <Title headingLevel="h1" ref={title} tabIndex={-1}>
             {children}

@@ -13,6 +13,7 @@ import type { ReactNode } from 'react';
 import { live } from '../live/live';
 import { useTexts } from '../texts/TextsProvider';
 import { errorText } from './errorText';
+import { useArrival } from './ViewTitle';
 
 export function Loading() {
     const { t } = useTexts();
@@ -30,11 +31,21 @@ interface FailedProps {
     action?: ReactNode;
 }
 
-/** Nothing could be read at all. */
+/** Stands in the place of a view of which nothing could be read at all. */
 export function Failed({ title, error, action }: FailedProps) {
     const { t } = useTexts();
+    const heading = useArrival<HTMLSpanElement>();
     return (
-        <EmptyState titleText={title} headingLevel="h2" status="danger" icon={ExclamationCircleIcon}>
+        <EmptyState
+            titleText={
+                <span ref={heading} tabIndex={-1}>
+                    {title}
+                </span>
+            }
+            headingLevel="h1"
+            status="danger"
+            icon={ExclamationCircleIcon}
+        >
             <EmptyStateBody>{errorText(error, t)}</EmptyStateBody>
             <EmptyStateFooter>
                 <EmptyStateActions>
