@@ -8,6 +8,7 @@
 #include <regex>
 #include <string>
 #include <thread>
+#include <utility>
 
 #include "tests/appliance/modules/ModuleTest.h"
 
@@ -68,6 +69,26 @@ TEST_F(CleanPreviewTest, WithoutSharesItLooksAtAll) {
     EXPECT_THAT(Preview(R"({"keep_smaller":4})"), HasSubstr(R"("rule":"smaller")"));
 }
 
+TEST_F(CleanPreviewTest, TheOrderSaysWhatGoesFirst) {
+    InstallCleaner();
+    const auto changed = [this](const std::string& file) {
+        struct stat status {};
+        EXPECT_EQ(::stat((RootPath() + file).c_str(), &status), 0);
+        return std::pair(status.st_ctim.tv_sec, status.st_ctim.tv_nsec);
+    };
+    const std::string film = "/volume1/media/.recycle/film";
+    const std::string youngAndLarge = "/volume1/media/.recycle/series";
+    // The file system's clock goes in steps.
+    do {
+        Write(youngAndLarge, "123456789");
+    } while (changed(youngAndLarge) <= changed(film));
+    EXPECT_THAT(Preview(R"({"bytes":9,"order":"oldest","shares":["media"]})"),
+                HasSubstr(R"("removed":[{"bytes":7,"path":"film","share":"media","since":"T"}])"));
+    EXPECT_THAT(
+        Preview(R"({"bytes":9,"order":"largest","shares":["media"]})"),
+        HasSubstr(R"("removed":[{"bytes":9,"path":"series","share":"media","since":"T"}])"));
+}
+
 TEST_F(CleanPreviewTest, ZeroDaysAndZeroBytesMeanWhatTheyMeanToTheCleaner) {
     InstallCleaner();
     EXPECT_THAT(Preview(R"({"days":0})"), HasSubstr(R"("remove":{"bytes":15,"count":3})"));
@@ -105,7 +126,7 @@ TEST_F(CleanPreviewTest, WhatTheCleanerWouldNotUnderstandIsRefusedFirst) {
     refused(R"({"bytes":1,"days":1})", "bytes: cannot be combined with days");
     refused(R"({"bytes":1,"order":"newest"})", "order: is neither oldest nor largest");
     refused(R"({"extensions":"pdf"})", "extensions: is no array of at most 100 texts");
-    for (const char* text : {R"(a\"b)", "a$b", "a`b", R"(a\\b)", R"(a\nb)", R"(a\tb)"}) {
+    for (const char* text : {R"(a\"b)", "a$b", "a`b", R"(a\\b)", R"(a\nb)", R"(a\tb)", "a\x7f"}) {
         refused(
             R"({"extensions":[")" + std::string(text) + "\"]}",
             "extensions: holds a quote, $, `, \\ or a control character, which the command of a "
@@ -135,7 +156,9 @@ TEST_F(CleanPreviewTest, TwoGoOnAtOnceAndAThirdIsRefused) {
     while (begun() < 2 && std::chrono::steady_clock::now() < deadline) {
         std::this_thread::yield();
     }
-    EXPECT_EQ(Preview("{}"), Refusal(124, "other previews are going on; try again shortly"));
+    for (int more = 0; more < 2; ++more) {
+        EXPECT_EQ(Preview("{}"), Refusal(124, "other previews are going on; try again shortly"));
+    }
     Write("/usr/orva/bin/orvarecycle.go", "");
     EXPECT_THAT(first.get(), HasSubstr("\"complete\":true"));
     EXPECT_THAT(second.get(), HasSubstr("\"complete\":true"));
