@@ -1,6 +1,7 @@
 #include "appliance/runs/RunWriter.h"
 
 #include <chrono>
+#include <limits>
 
 #include "appliance/store/TaskTable.h"
 
@@ -273,8 +274,12 @@ void TrimRunsOfTask(Connection& connection, int task) {
 }
 
 std::optional<int> NextTaskWithRuns(Connection& connection, int after) {
-    Query query = connection.Prepare("SELECT task FROM run WHERE task > ? ORDER BY task LIMIT 1");
+    // What a damaged row has there may be no number, or none of a task: whoever goes on from what
+    // that reads as would come by for ever.
+    Query query = connection.Prepare(
+        "SELECT task FROM run WHERE task > ? AND task <= ? ORDER BY task LIMIT 1");
     query->bind(1, after);
+    query->bind(2, std::numeric_limits<int>::max());
     if (!query->executeStep()) {
         return std::nullopt;
     }

@@ -106,14 +106,25 @@ std::size_t ConfiguredMostRuns() {
     return number;
 }
 
-// Only when many runs were asked for: what is started here inherits the limit.
-void AllowDescriptors(std::size_t runs) {
+// How many of the runs there are descriptors for: one for which there is none would end unstarted
+// instead of waiting for its turn. The limit is raised only when many were asked for, since what is
+// started here inherits it.
+std::size_t RunsWithDescriptors(std::size_t runs) {
     const rlim_t needed = static_cast<rlim_t>(runs) + kOtherDescriptors;
     rlimit limit{};
-    if (::getrlimit(RLIMIT_NOFILE, &limit) == 0 && limit.rlim_cur < needed) {
-        limit.rlim_cur = std::min(limit.rlim_max, needed);
-        ::setrlimit(RLIMIT_NOFILE, &limit);
+    if (::getrlimit(RLIMIT_NOFILE, &limit) != 0 || limit.rlim_cur >= needed) {
+        return runs;
     }
+    limit.rlim_cur = std::min(limit.rlim_max, needed);
+    ::setrlimit(RLIMIT_NOFILE, &limit);
+    if (limit.rlim_cur == needed) {
+        return runs;
+    }
+    const std::size_t enough =
+        limit.rlim_cur > kOtherDescriptors ? limit.rlim_cur - kOtherDescriptors : 1;
+    ::syslog(LOG_WARNING, "%s: %zu runs at once, not %zu: the limit on open files is %zu",
+             kMostRunsKey, enough, runs, static_cast<std::size_t>(limit.rlim_cur));
+    return enough;
 }
 
 }  // namespace
@@ -174,9 +185,7 @@ void Daemon::OnSignal(int signalNumber) {
 }
 
 void Daemon::ReadConfiguration() {
-    const std::size_t mostRuns = ConfiguredMostRuns();
-    AllowDescriptors(mostRuns);
-    scheduler.SetMostRuns(mostRuns);
+    scheduler.SetMostRuns(RunsWithDescriptors(ConfiguredMostRuns()));
 }
 
 void Daemon::WatchSocket() {

@@ -13,6 +13,12 @@ PlannedStart Skipped(StartSecond occurrence, std::string_view why) {
     return {occurrence, RunReason::kSchedule, why};
 }
 
+// A save made while this is planned may be a little later than `now`. One that is later still was
+// made by a clock that was ahead: nobody knows when that was.
+StartSecond KnownSince(StartSecond since, const Moment& moment) {
+    return absl::FromUnixSeconds(since) > moment.now + kOnTime ? kUnknownStart : since;
+}
+
 PlannedStart PlanLatest(const TaskData& task, StartSecond latest, StartSecond since,
                         const Moment& moment) {
     if (!task.Has(kEnabled)) {
@@ -38,6 +44,7 @@ PlannedStart PlanLatest(const TaskData& task, StartSecond latest, StartSecond si
 
 DuePlan PlanDueTask(const TaskData& task, StartSecond due, StartSecond since,
                     const Moment& moment) {
+    since = KnownSince(since, moment);
     DuePlan plan;
     plan.next = ComputeNextStart(task, moment.zone, moment.now);
     if (!task.Has(kEnabled)) {

@@ -62,7 +62,8 @@ struct DuePlan {
 
 // What becomes of a task whose next start, as stored, has come. Of starts that were missed the
 // latest one goes into the history and stands for all. `since` says from when on the task has its
-// schedule, or is enabled: a save makes no start of a time before it, and has none made up for.
+// schedule, or is enabled: a save makes no start of a time before it, and has none made up for. One
+// in the future says nothing.
 DuePlan PlanDueTask(const TaskData& task, StartSecond due, StartSecond since, const Moment& moment);
 
 // Why a run that has waited since then is not started any more; empty when it is.

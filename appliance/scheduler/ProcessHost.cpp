@@ -117,6 +117,12 @@ std::optional<RunRemains> ProcessHost::Remains(std::int64_t run) const {
     if (!remains.ending && LacksResources()) {
         return std::nullopt;
     }
+    if (!remains.ending && notBegun.count(run) != 0) {
+        // It cannot be started at all, perhaps: another try might end the same way, for ever.
+        remains.ending.emplace();
+        remains.ending->ended = RunTimeNow();
+        remains.ending->why = "cannot start " + program + ": it ended before its first step";
+    }
     if (std::optional<StoredOutput> output = folder.Output()) {
         remains.output = *std::move(output);
     } else if (LacksResources()) {
@@ -128,6 +134,7 @@ std::optional<RunRemains> ProcessHost::Remains(std::int64_t run) const {
 void ProcessHost::Remove(std::int64_t run) {
     watches.erase(run);
     prepared.erase(run);
+    notBegun.erase(run);
     // A folder that cannot be removed has been logged; the next scheduler tries again.
     static_cast<void>(RunFolder(run).Remove());
 }
@@ -215,6 +222,9 @@ void ProcessHost::LookAgain(Watch& watch) {
             }
             return;
         case RunFolder::State::kNotBegun:
+            notBegun.insert(watch.run);
+            End(watch);
+            return;
         case RunFolder::State::kEnded:
             End(watch);
             return;

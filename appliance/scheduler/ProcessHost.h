@@ -7,6 +7,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -57,6 +58,8 @@ class ProcessHost final : public RunHost {
     // The locks of runs that were prepared and have not begun.
     std::map<std::int64_t, FileDescriptor> prepared;
     std::map<std::int64_t, std::unique_ptr<Watch>> watches;
+    // Whose supervisor has ended before its first step.
+    std::set<std::int64_t> notBegun;
 };
 
 }  // namespace orva

@@ -20,11 +20,26 @@ constexpr int kTrimmedRunsAtOnce = 20;
 // How often an ending is tried again that could not be read.
 constexpr absl::Duration kReadInterval = absl::Milliseconds(500);
 
+// How often a clock that is not trusted is looked at. A time service that finds it right does not
+// set it: that wakes nobody.
+constexpr absl::Duration kClockInterval = absl::Minutes(1);
+
 constexpr std::string_view kWhyRestarted = "the machine was restarted";
 constexpr std::string_view kWhyNoTrace = "its supervisor has left no ending";
 
 absl::Time TimeOf(StartSecond start) {
     return start == kNoStart ? absl::InfiniteFuture() : absl::FromUnixSeconds(start);
+}
+
+// Starts may lie years ahead of such a clock: then the history has nothing that would tell.
+void LogClockTrust(const Moment& moment) {
+    if (moment.clockTrusted) {
+        syslog(LOG_NOTICE, "the clock is trusted again");
+        return;
+    }
+    syslog(LOG_WARNING,
+           "the clock shows %s, which cannot be right: no task starts by itself until it is set",
+           absl::FormatTime("%Y-%m-%dT%H:%M:%SZ", moment.now, absl::UTCTimeZone()).c_str());
 }
 
 }  // namespace
@@ -53,7 +68,6 @@ void Scheduler::Recover() {
         const std::uint64_t present = database.Generation();
         WriteTransaction transaction(database);
         clock.Remember(NewestRecord(*transaction));
-        clockTrusted = CurrentMoment().clockTrusted;
         for (const RunningRun& run : ReadRunningRuns(*transaction)) {
             TakeOver(*transaction, run);
         }
@@ -82,7 +96,6 @@ void Scheduler::ForgetAll() {
     unreadable.clear();
     failedStarts.clear();
     corrected = 0;
-    moreDue = false;
 }
 
 void Scheduler::TakeOver(Connection& connection, const RunningRun& run) {
@@ -132,10 +145,14 @@ absl::Time Scheduler::Work() {
     if (ended.empty()) {
         ended.swap(unreadable);
     }
-    if (moment.zone != zoneOfStarts || moment.clockTrusted != clockTrusted) {
+    if (moment.zone != zoneOfStarts) {
         zoneOfStarts = moment.zone;
+        corrected = 0;
+    }
+    if (moment.clockTrusted != clockTrusted) {
         clockTrusted = moment.clockTrusted;
         corrected = 0;
+        LogClockTrust(moment);
     }
     return Guarded(store.UsedDatabase(), [&] {
         if (HasWork(moment)) {
@@ -171,7 +188,6 @@ void Scheduler::DoWork(const Moment& moment) {
     if (step.otherDatabase) {
         return;
     }
-    moreDue = step.moreDue;
     clockWasSet = clockWasSet && !step.recordsClock;
     corrected = step.corrected;
     runningTasks = std::move(step.tasks);
@@ -227,13 +243,20 @@ bool Scheduler::HasOutdated(const Moment& moment) const {
 }
 
 absl::Time Scheduler::NextCall(const Moment& moment) {
-    if (!ended.empty() || moreDue || Corrects(moment) || CanStart() || HasOutdated(moment) ||
+    if (!ended.empty() || Corrects(moment) || CanStart() || HasOutdated(moment) ||
         store.UsedDatabase().Generation() != generation) {
         return absl::InfinitePast();
     }
     Database::Lease lease(store.UsedDatabase());
-    const absl::Time next = std::min(TimeOf(EarliestStart(*lease)),
-                                     waiting.OldestSince() + kQueuePatience + absl::Seconds(1));
+    const absl::Time start = TimeOf(EarliestStart(*lease));
+    if (start <= moment.now) {
+        // More has come than one step takes.
+        return absl::InfinitePast();
+    }
+    absl::Time next = std::min(start, waiting.OldestSince() + kQueuePatience + absl::Seconds(1));
+    if (!moment.clockTrusted) {
+        next = std::min(next, moment.now + kClockInterval);
+    }
     return unreadable.empty() ? next : std::min(next, moment.now + kReadInterval);
 }
 

@@ -102,7 +102,6 @@ class Scheduler {
         std::size_t endings = 0;
         std::set<std::int64_t> unreadable;
         std::vector<Beginning> beginnings;
-        bool moreDue = false;
         bool recordsClock = false;
         // Up to which task next starts are corrected.
         std::optional<std::int64_t> corrected;
@@ -168,7 +167,6 @@ class Scheduler {
     bool clockTrusted = true;
     // The clock was set, and that is not stored yet.
     bool clockWasSet = false;
-    bool moreDue = false;
     // Up to which task old runs have been removed.
     int trimmedTask = 0;
 };

@@ -104,7 +104,6 @@ void Scheduler::RecordDueTasks(Connection& connection, const Moment& moment, Ste
         SetNextStart(connection, task.id, plan.next);
         TrimRunsOfTask(connection, task.id);
     }
-    step.moreDue = due.read == std::size_t{kDueAtOnce};
 }
 
 // Whether it may not run beside the run that waits. Otherwise a task would queue one more at each

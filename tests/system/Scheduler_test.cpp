@@ -3,6 +3,7 @@
 #include <absl/time/clock.h>
 #include <gmock/gmock.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 
 #include <filesystem>
@@ -169,6 +170,30 @@ TEST_F(SchedulerSystemTest, TheLimitOnRunsIsReadAgainAtASignal) {
     }));
     appliance.Root().Write("go", "");
     appliance.WaitUntilIdle();
+}
+
+TEST_F(SchedulerSystemTest, RunsForWhichThereIsNoFileDescriptorWaitForTheirTurn) {
+    appliance.Start();
+    const rlimit few{70, 70};
+    ASSERT_EQ(::prlimit(appliance.Pid(), RLIMIT_NOFILE, &few, nullptr), 0);
+    appliance.Signal(SIGHUP);
+    EXPECT_TRUE(orva::test::WaitFor([&] {
+        return appliance.ErrorText().find(
+                   "schedmaxruns: 6 runs at once, not 64: the limit on open files is 70") !=
+               std::string::npos;
+    }));
+    const int task = appliance.AddTask("until [ -e " + Mark("go") +
+                                       " ]; do sleep 0.05; done; echo x >>" + Mark("marks"));
+    for (int count = 0; count < 70; ++count) {
+        TaskStore::Current()->QueueRun(task);
+    }
+    EXPECT_EQ(SchedulerLink::Stop(1000), "no such run");
+    appliance.Root().Write("go", "");
+    appliance.WaitUntilIdle();
+    for (const orva::Run& run : appliance.Runs()) {
+        EXPECT_EQ(run.exitStatus, 0) << run.id << ": " << run.why;
+    }
+    EXPECT_EQ(ReadWholeFile(Mark("marks")).size(), 140U);
 }
 
 TEST_F(SchedulerSystemTest, ADatabaseThatIsLockedForTenSecondsDelaysAndLosesNothing) {

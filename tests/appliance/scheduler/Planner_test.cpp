@@ -100,6 +100,17 @@ TEST(PlannerTest, WhatCameBeforeTheTaskWasSavedIsNotMadeUpForBySavingIt) {
                 ElementsAre(Planned("2026-05-01 08:59:30", RunReason::kSchedule)));
 }
 
+TEST(PlannerTest, ATimeOfSavingThatIsStillToComeSaysNothing) {
+    TaskData task = SampleTask();
+    task.schedule.runMissed = true;
+    const Moment moment = At("2026-05-01 09:00:00");
+    EXPECT_THAT(Plan(task, "2026-04-30 06:30:00", moment, "2026-05-01 09:01:01").starts,
+                ElementsAre(Planned("2026-05-01 06:30:00", RunReason::kMissed)));
+    // The task was saved just now.
+    EXPECT_THAT(Plan(task, "2026-04-30 06:30:00", moment, "2026-05-01 09:00:59").starts,
+                ElementsAre(Planned("2026-04-30 06:30:00", RunReason::kSchedule, "missed")));
+}
+
 TEST(PlannerTest, OfManyMissedStartsTheLatestGoesOnRecord) {
     const DuePlan plan = Plan(SampleTask(), "2026-04-20 06:30:00", At("2026-05-01 12:00:00"));
     EXPECT_THAT(plan.starts,

@@ -7,6 +7,7 @@
 
 #include <cerrno>
 #include <string>
+#include <vector>
 
 #include "appliance/supervisor/RunFolder.h"
 #include "tests/appliance/util/Sandbox.h"
@@ -77,6 +78,26 @@ TEST_F(ProcessHostTest, WhatCannotBeReadForWantOfDescriptorsIsNotTakenForMissing
     ASSERT_TRUE(remains);
     EXPECT_EQ(remains->ending, ending);
     EXPECT_EQ(remains->output.head, "printed");
+}
+
+// Its libraries are being replaced, for example.
+TEST_F(ProcessHostTest, ARunWhoseSupervisorEndsBeforeItsFirstStepHasNotBegun) {
+    std::vector<std::int64_t> over;
+    orva::ProcessHost started(event.get(), "/bin/false",
+                              [&](std::int64_t run) { over.push_back(run); });
+    ASSERT_EQ(started.Prepare({2, 1, "root", "true", {}}), std::nullopt);
+    ASSERT_EQ(started.Start(2), std::nullopt);
+    while (over.empty()) {
+        ASSERT_GT(sd_event_run(event.get(), 10'000'000), 0);
+    }
+    EXPECT_EQ(over, std::vector<std::int64_t>{2});
+    const std::optional<orva::RunRemains> remains = started.Remains(2);
+    ASSERT_TRUE(remains);
+    ASSERT_TRUE(remains->ending);
+    EXPECT_FALSE(remains->ending->started);
+    EXPECT_EQ(remains->ending->why, "cannot start /bin/false: it ended before its first step");
+    started.Remove(2);
+    EXPECT_FALSE(started.Remains(2)->ending);
 }
 
 }  // namespace

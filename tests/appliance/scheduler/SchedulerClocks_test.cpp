@@ -183,16 +183,17 @@ TEST_F(SchedulerClocksTest, AClockThatStandsADayBeforeTheHistoryStartsNothing) {
 }
 
 TEST_F(SchedulerClocksTest, AClockThatWasSetIsStillTrustedAfterARestart) {
-    AddTask("a", 12, 30);
+    const int id = AddTask("a", 12, 30);
     SetNow("2027-05-01 12:30:00");
     Work();
     End(host.started.back().run);
     Work();
     SetNow("2026-05-01 12:00:00");
     RestartAndRecover();
-    EXPECT_EQ(Work(), Utc("2027-05-02 12:30:00"));
-    scheduler->ClockWasSet();
     Work();
+    EXPECT_EQ(NextStart(id), "05-02 12:30");
+    scheduler->ClockWasSet();
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00"));
     RestartAndRecover();
     SetNow("2026-05-01 12:30:00");
     Work();
@@ -206,6 +207,62 @@ TEST_F(SchedulerClocksTest, AClockThatWasSetIsStillTrustedAfterARestart) {
     Execute("UPDATE task SET next_start = 1777465800");
     Work();
     EXPECT_EQ(host.started.size(), 2U);
+}
+
+// A service that has next to nothing to put right does not set the clock: it lets it run a bit
+// faster or slower.
+TEST_F(SchedulerClocksTest, AClockThatATimeServiceFindsRightIsTrustedWithinAMinute) {
+    bool synchronised = false;
+    options.clockSynchronised = [&] { return synchronised; };
+    AddTask("a", 12, 30);
+    SetNow("2027-05-01 12:30:00");
+    Work();
+    End(host.started.back().run);
+    Work();
+    SetNow("2026-05-01 12:00:00");
+    RestartAndRecover();
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:01:00"));
+    synchronised = true;
+    SetNow("2026-05-01 12:01:00");
+    EXPECT_EQ(Work(), Utc("2026-05-01 12:30:00"));
+    SetNow("2026-05-01 12:30:00");
+    Work();
+    EXPECT_EQ(host.started.size(), 2U);
+}
+
+TEST_F(SchedulerClocksTest, AClockThatIsNotTrustedIsSaidInTheLog) {
+    options.programMade = Utc("2026-04-01 00:00:00");
+    SetNow("2000-01-01 00:00:00");
+    RestartAndRecover();
+    TakeLog();
+    Work();
+    Work();
+    EXPECT_THAT(TakeLog(), ElementsAre("the clock shows 2000-01-01T00:00:00Z, which cannot be "
+                                       "right: no task starts by itself until it is set"));
+    SetNow("2026-05-01 12:00:00");
+    scheduler->ClockWasSet();
+    Work();
+    Work();
+    EXPECT_THAT(TakeLog(), ElementsAre("the clock is trusted again"));
+}
+
+TEST_F(SchedulerClocksTest, ATaskThatWasSavedByAClockAheadIsMadeUpForAllTheSame) {
+    orva::TaskData task = SampleTask("a");
+    task.flags |= kTogether;
+    task.schedule.firstMinute = 18 * 60;
+    const int id = AddTask(task);
+    SetNow("2027-05-01 12:00:00");
+    task = Stored(id);
+    task.schedule.firstMinute = 19 * 60;
+    task.schedule.runMissed = true;
+    AddTask(task);
+    SetNow("2026-05-01 12:10:00");
+    scheduler->ClockWasSet();
+    EXPECT_EQ(Work(), Utc("2026-05-01 19:00:00"));
+    SetNow("2026-05-05 09:00:00");
+    RestartAndRecover();
+    Work();
+    EXPECT_THAT(History(), ElementsAre("a 05-04 19:00 missed running -"));
 }
 
 TEST_F(SchedulerClocksTest, AClockThatWasSetToANonsensicalTimeIsNotRemembered) {

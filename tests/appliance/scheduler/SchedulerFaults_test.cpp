@@ -341,6 +341,22 @@ TEST_F(SchedulerFaultsTest, ANextStartFarBeforeAllTimeIsMissed) {
     EXPECT_THAT(History(), ElementsAre("a 04-30 12:30 schedule skipped missed"));
 }
 
+TEST_F(SchedulerFaultsTest, TheWalkOverOldRunsEndsWhateverADamagedRowHolds) {
+    constexpr int kPlenty = 1000;
+    for (const char* task : {"1", "'x'", "4294967297"}) {
+        Execute(
+            "INSERT INTO run (task, reason, state, queued_at, asked_program, asked_account) "
+            "VALUES (" +
+            std::string(task) + ", 'hand', 'ended', 0, '', '')");
+    }
+    int steps = 0;
+    while (steps < kPlenty && scheduler->RemoveOldRuns()) {
+        ++steps;
+    }
+    EXPECT_LT(steps, kPlenty);
+    EXPECT_EQ(Find(1), std::nullopt);
+}
+
 TEST_F(SchedulerFaultsTest, ARunOfATaskThatIsDamagedMeanwhileEndsWithTheReason) {
     options.mostRuns = 1;
     RestartAndRecover();

@@ -110,6 +110,15 @@ TEST_F(SchedulerTest, TwoHundredTasksDueInOneSecondAreEachStartedOnce) {
     EXPECT_EQ(orva::RunStore::Current()->List({{}, orva::RunState::kEnded}, 0, 0).total, 200);
 }
 
+TEST_F(SchedulerTest, AsManyStartsAsOneStepTakesLeaveNothingToDo) {
+    for (int count = 0; count < 250; ++count) {
+        AddTask("a", 18, 0);
+    }
+    SetNow("2026-05-03 12:00:00");
+    EXPECT_EQ(Work(), Utc("2026-05-03 18:00:00"));
+    EXPECT_EQ(History().size(), 250U);
+}
+
 TEST_F(SchedulerTest, ATaskThatStillRunsIsNotStartedAgain) {
     orva::TaskData task = SampleTask("a");
     task.schedule.firstMinute = 0;
