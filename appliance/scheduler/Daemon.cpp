@@ -33,7 +33,9 @@ constexpr std::uint64_t kSecond = 1'000'000;
 // When another process holds the database, and when it is out of order.
 constexpr std::uint64_t kBusyRetryInterval = kSecond / 2;
 constexpr std::uint64_t kRetryInterval = kSecond * 10;
-constexpr std::uint64_t kTrimFirst = 60 * kSecond;
+// A machine's clock may be months ahead until a time service sets it: by such a clock the whole
+// history is old.
+constexpr std::uint64_t kTrimFirst = kSecond * 3600;
 constexpr std::uint64_t kTrimStep = kSecond / 20;
 constexpr std::uint64_t kTrimInterval = kSecond * 3600 * 6;
 
@@ -260,6 +262,7 @@ void Daemon::WakeAt(absl::Time time) {
 void Daemon::OnClockSet() {
     ::syslog(LOG_NOTICE, "the clock was set");
     scheduler.ClockWasSet();
+    TrimAfter(kTrimFirst);
     WorkSoon();
 }
 
