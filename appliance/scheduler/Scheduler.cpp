@@ -25,7 +25,7 @@ constexpr absl::Duration kReadInterval = absl::Milliseconds(500);
 constexpr absl::Duration kClockInterval = absl::Minutes(1);
 
 constexpr std::string_view kWhyRestarted = "the machine was restarted";
-constexpr std::string_view kWhyNoTrace = "its supervisor has left no ending";
+constexpr std::string_view kWhyNoEnding = "its supervisor has left no ending";
 
 absl::Time TimeOf(StartSecond start) {
     return start == kNoStart ? absl::InfiniteFuture() : absl::FromUnixSeconds(start);
@@ -113,14 +113,14 @@ void Scheduler::TakeOver(Connection& connection, const RunningRun& run) {
             MarkQueued(connection, run.id);
             return;
         case RunHost::Trace::kOver:
-            Ended(run.id, kWhyNoTrace);
+            Ended(run.id, kWhyNoEnding);
             return;
         case RunHost::Trace::kGoesOn:
             return;
     }
 }
 
-void Scheduler::RunEnded(std::int64_t run) { Ended(run, kWhyNoTrace); }
+void Scheduler::RunEnded(std::int64_t run) { Ended(run, kWhyNoEnding); }
 
 void Scheduler::Ended(std::int64_t run, std::string_view whyLost) {
     ended.push_back({run, whyLost});

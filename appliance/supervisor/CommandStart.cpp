@@ -57,6 +57,10 @@ std::optional<StartedCommand> StartedCommand::Start(const Owner& owner, const st
     FileDescriptor reading(ends[0]);
     const FileDescriptor writing(ends[1]);
     const FileDescriptor program(::open("/proc/self/exe", O_RDONLY | O_CLOEXEC));
+    if (!program.IsOpen()) {
+        why = CannotStart(errno);
+        return std::nullopt;
+    }
     // Out of the way of the numbers that they are given to.
     const FileDescriptor reportSource(::fcntl(writing.Get(), F_DUPFD_CLOEXEC, kProgram + 1));
     const FileDescriptor programSource(::fcntl(program.Get(), F_DUPFD_CLOEXEC, kProgram + 1));
