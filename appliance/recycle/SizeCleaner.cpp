@@ -2,35 +2,23 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <limits>
+#include <utility>
 #include <vector>
 
 #include "appliance/recycle/BinWalker.h"
 #include "appliance/recycle/NameStore.h"
+#include "appliance/recycle/RemovalPlan.h"
 #include "appliance/recycle/RemoveEntry.h"
 
 namespace orva {
 namespace {
-
-// Sparse files may claim more bytes together than 64 bits can count.
-__extension__ using ByteSum = unsigned __int128;
 
 using Index = DirectoryTree::Index;
 
 // A directory moved out of the bin must not be cleaned through a descriptor from before, so that
 // the place of each is looked at anew after this many removals.
 constexpr unsigned kRemovalsPerCheck = 64;
-
-struct Candidate {
-    std::uint64_t bytes;
-    FileTime changed;
-    std::uint64_t inode;
-    NameStore::Place name;
-    Index directory;
-    FileKind kind;
-    bool linked;  // has other hard links, whose removal changes its time
-};
 
 // Looks at the whole bin. Only folders that hold nothing go already.
 class Collector final : public BinVisitor {
@@ -88,41 +76,6 @@ class Collector final : public BinVisitor {
     CleanRun& run;
     CleanTotals& totals;
 };
-
-// Where each directory stands when all are sorted by their paths, a directory before those in it.
-std::vector<Index> RankDirectories(const DirectoryTree& tree) {
-    std::vector<Index> sorted(tree.Count());
-    for (Index at = 0; at < sorted.size(); ++at) {
-        sorted[at] = at;
-    }
-    // The bin, its own parent, comes first.
-    std::sort(sorted.begin() + 1, sorted.end(), [&tree](Index left, Index right) {
-        const Index leftParent = tree.Parent(left);
-        const Index rightParent = tree.Parent(right);
-        return leftParent != rightParent ? leftParent < rightParent
-                                         : std::strcmp(tree.Name(left), tree.Name(right)) < 0;
-    });
-    std::vector<Index> firstChild(tree.Count() + std::size_t{1}, 0);
-    for (std::size_t at = 1; at < sorted.size(); ++at) {
-        ++firstChild[tree.Parent(sorted[at]) + std::size_t{1}];
-    }
-    firstChild[0] = 1;
-    for (std::size_t at = 1; at < firstChild.size(); ++at) {
-        firstChild[at] += firstChild[at - 1];
-    }
-    std::vector<Index> ranks(tree.Count());
-    std::vector<Index> waiting = {DirectoryTree::kBin};
-    for (Index rank = 0; !waiting.empty(); ++rank) {
-        const Index directory = waiting.back();
-        waiting.pop_back();
-        ranks[directory] = rank;
-        for (Index child = firstChild[directory + std::size_t{1}]; child > firstChild[directory];
-             --child) {
-            waiting.push_back(sorted[child - 1]);
-        }
-    }
-    return ranks;
-}
 
 class Remover {
   public:
@@ -197,24 +150,6 @@ class Remover {
     unsigned sinceCheck = 0;
 };
 
-void SortCandidates(std::vector<Candidate>& candidates, const DirectoryTree& tree,
-                    const NameStore& names, SizeOrder order) {
-    const std::vector<Index> ranks = RankDirectories(tree);
-    std::sort(candidates.begin(), candidates.end(),
-              [&](const Candidate& left, const Candidate& right) {
-                  if (order == SizeOrder::kLargestFirst && left.bytes != right.bytes) {
-                      return left.bytes > right.bytes;
-                  }
-                  if (left.changed != right.changed) {
-                      return left.changed < right.changed;
-                  }
-                  if (left.directory != right.directory) {
-                      return ranks[left.directory] < ranks[right.directory];
-                  }
-                  return std::strcmp(names.At(left.name), names.At(right.name)) < 0;
-              });
-}
-
 }  // namespace
 
 CleanTotals CleanToSize(DirectoryTree& tree, CleanRun& run) {
@@ -225,16 +160,19 @@ CleanTotals CleanToSize(DirectoryTree& tree, CleanRun& run) {
     BinWalker(tree, bin).Walk();
 
     Remover remover(tree, run, totals, bin.names, bin.size);
-    std::size_t next = 0;
-    if (bin.size > limit) {
-        SortCandidates(bin.candidates, tree, bin.names, rules.order);
-        while (remover.Size() > limit && next < bin.candidates.size()) {
-            remover.Remove(bin.candidates[next]);
-            ++next;
+    const auto excess = [&remover, limit] {
+        return remover.Size() > limit ? remover.Size() - limit : ByteSum{0};
+    };
+    RemovalPlan plan(std::move(bin.candidates), rules.order, tree, bin.names);
+    for (auto chosen = plan.Next(excess()); !chosen.empty(); chosen = plan.Next(excess())) {
+        if (!run.preview) {
+            ArrangeByFolder(chosen);
+        }
+        for (const Candidate& candidate : chosen) {
+            remover.Remove(candidate);
         }
     }
-    for (; next < bin.candidates.size(); ++next) {
-        const Candidate& stays = bin.candidates[next];
+    for (const Candidate& stays : plan.Rest()) {
         totals.AddKept(stays.bytes);
         if (run.preview) {
             run.report.Stays({tree.Path(stays.directory) + bin.names.At(stays.name), stays.kind,
@@ -242,11 +180,8 @@ CleanTotals CleanToSize(DirectoryTree& tree, CleanRun& run) {
                              KeepReason::kWithinSize);
         }
     }
-    if (remover.Size() > limit) {
-        const ByteSum over = remover.Size() - limit;
-        constexpr std::uint64_t kLargest = std::numeric_limits<std::uint64_t>::max();
-        totals.overLimit = over > kLargest ? kLargest : static_cast<std::uint64_t>(over);
-    }
+    constexpr std::uint64_t kLargest = std::numeric_limits<std::uint64_t>::max();
+    totals.overLimit = static_cast<std::uint64_t>(std::min<ByteSum>(excess(), kLargest));
     return totals;
 }
 

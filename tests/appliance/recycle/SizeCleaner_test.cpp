@@ -2,9 +2,13 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <linux/capability.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
+#include <cerrno>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -15,10 +19,48 @@
 namespace orva {
 namespace {
 
+using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::IsSupersetOf;
 using testing::Pair;
 using testing::UnorderedElementsAre;
+
+// While it lives, the modes of folders bind this thread even when it is root's.
+class BoundByModes {
+  public:
+    BoundByModes() {
+        __user_cap_data_struct fewer[_LINUX_CAPABILITY_U32S_3];
+        EXPECT_EQ(::syscall(SYS_capget, &header, before), 0);
+        std::copy(std::begin(before), std::end(before), fewer);
+        fewer[0].effective &= ~(1U << CAP_DAC_OVERRIDE);
+        EXPECT_EQ(::syscall(SYS_capset, &header, fewer), 0);
+    }
+    ~BoundByModes() { EXPECT_EQ(::syscall(SYS_capset, &header, before), 0); }
+    BoundByModes(const BoundByModes&) = delete;
+    BoundByModes& operator=(const BoundByModes&) = delete;
+
+  private:
+    __user_cap_header_struct header{_LINUX_CAPABILITY_VERSION_3, 0};
+    __user_cap_data_struct before[_LINUX_CAPABILITY_U32S_3] = {};
+};
+
+// Stops a clean in its middle: at the first failure.
+class StoppingReport final : public CleanReport {
+  public:
+    struct Stop {};
+
+    StoppingReport() : CleanReport(stdout, stderr, false) {}
+
+    void BeginBin(const std::string&) override {}
+    void EndBin(const CleanTotals&) override {}
+    void Goes(const ReportedEntry&) override {}
+    void Stays(const ReportedEntry&, KeepReason) override {}
+    void Failed(std::string_view, std::string_view, int) override { throw Stop(); }
+    void Problem(const std::string&, const std::string&) override {}
+    void Note(const std::string&, const std::string&) override {}
+    bool Finish() override { return true; }
+};
 
 class SizeCleanerTest : public BinTest {
   protected:
@@ -28,6 +70,38 @@ class SizeCleanerTest : public BinTest {
         rules.order = order;
         return rules;
     }
+
+    // The folder "locked" lets nobody remove its files meanwhile.
+    CleanTotals CleanWhileLocked(const CleanRules& rules) {
+        const Lock lock(InBin("locked"));
+        return Clean(rules);
+    }
+
+    // Ends in the middle, at the first file of "locked".
+    void CleanUntilAFailure(const CleanRules& rules) {
+        const Lock lock(InBin("locked"));
+        const CleanJudge judge(rules, 0);
+        StoppingReport stopping;
+        LinkTimes links;
+        CleanRun run{judge, stopping, links};
+        BinOpening opening = OpenAndLockBin(SharePath(), false, [] {});
+        EXPECT_THROW(CleanBin(std::move(*opening.bin), run), StoppingReport::Stop);
+    }
+
+  private:
+    class Lock {
+      public:
+        explicit Lock(std::string folderPath) : folder(std::move(folderPath)) {
+            EXPECT_EQ(::chmod(folder.c_str(), 0555), 0);
+        }
+        ~Lock() { EXPECT_EQ(::chmod(folder.c_str(), 0755), 0); }
+        Lock(const Lock&) = delete;
+        Lock& operator=(const Lock&) = delete;
+
+      private:
+        std::string folder;
+        BoundByModes bound;
+    };
 };
 
 TEST_F(SizeCleanerTest, RemovesTheOldestUntilTheRestFits) {
@@ -187,6 +261,70 @@ TEST_F(SizeCleanerTest, GoesThroughManyFoldersInTheOrderOfSize) {
     EXPECT_EQ(totals.removedFiles, 2098U);
     EXPECT_EQ(totals.removedDirectories, 698U);
     EXPECT_THAT(Contents(), ElementsAre("album0/", "album0/file0", "album1/", "album1/file1"));
+}
+
+TEST_F(SizeCleanerTest, TakesTheNextInOrderForAFileThatCannotBeRemoved) {
+    File("locked/1", 10);
+    File("open/2", 10);
+    File("locked/3", 10);
+    File("open/4", 10);
+    File("open/5", 10);
+    const CleanTotals totals = CleanWhileLocked(Limit(30));
+    // Files 1 and 2 were to go; 4 makes up for 1, as 3 cannot be removed either.
+    EXPECT_THAT(Contents(),
+                UnorderedElementsAre("locked/", "locked/1", "locked/3", "open/", "open/5"));
+    EXPECT_THAT(report->failed, ElementsAre(Pair("locked/1", "remove " + std::to_string(EACCES)),
+                                            Pair("locked/3", "remove " + std::to_string(EACCES))));
+    EXPECT_EQ(totals.removedFiles, 2U);
+    EXPECT_EQ(totals.removedBytes, 20U);
+    EXPECT_EQ(totals.failures, 2U);
+    EXPECT_EQ(totals.keptFiles, 1U);
+    EXPECT_EQ(totals.overLimit, 0U);
+}
+
+TEST_F(SizeCleanerTest, SaysHowMuchIsLeftOverTheLimitWhenNothingElseCanGo) {
+    File("locked/1", 10);
+    File("2", 10);
+    const CleanTotals totals = CleanWhileLocked(Limit(3));
+    EXPECT_THAT(Contents(), UnorderedElementsAre("locked/", "locked/1"));
+    EXPECT_EQ(totals.failures, 1U);
+    EXPECT_EQ(totals.overLimit, 7U);
+}
+
+TEST_F(SizeCleanerTest, FinishesEachFolderBeforeTheNext) {
+    // In the order of size the folders take turns.
+    std::size_t bytes = 12;
+    for (const char* name : {"1", "2", "3"}) {
+        for (const char* folder : {"a/", "b/", "c/", "locked/"}) {
+            File(std::string(folder) + name, bytes--);
+        }
+    }
+    CleanUntilAFailure(Limit(0, SizeOrder::kLargestFirst));
+    const std::set<std::string> left = Contents();
+    for (const std::string& folder : std::vector<std::string>{"a/", "b/", "c/", "locked/"}) {
+        const auto files =
+            left.count(folder + "1") + left.count(folder + "2") + left.count(folder + "3");
+        EXPECT_EQ(files, left.count(folder) * 3) << folder;
+    }
+    EXPECT_EQ(left.count("locked/"), 1U);
+}
+
+TEST_F(SizeCleanerTest, HasRemovedNothingButWhatWasToGoWhenItIsStopped) {
+    // File N holds N bytes; those up to 10 are to stay.
+    for (std::size_t number = 1; number <= 50; ++number) {
+        const std::string folder = number == 35 ? "locked" : "album" + std::to_string(number % 4);
+        File(folder + "/" + std::to_string(number), number);
+    }
+    const std::set<std::string> stay = {"album0/",  "album0/4", "album0/8", "album1/",   "album1/1",
+                                        "album1/5", "album1/9", "album2/",  "album2/10", "album2/2",
+                                        "album2/6", "album3/",  "album3/3", "album3/7"};
+    const CleanRules rules = Limit(55, SizeOrder::kLargestFirst);
+    CleanUntilAFailure(rules);
+    EXPECT_THAT(Contents(), IsSupersetOf(stay));
+    EXPECT_THAT(Contents(), Contains("locked/35"));
+
+    Clean(rules);
+    EXPECT_EQ(Contents(), stay);
 }
 
 }  // namespace
