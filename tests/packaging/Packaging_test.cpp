@@ -21,6 +21,7 @@ using orva::test::ReadWholeFile;
 using orva::test::RunProcess;
 using orva::test::Sandbox;
 using testing::HasSubstr;
+using testing::Not;
 
 class PackagingTest : public testing::Test {
   protected:
@@ -33,6 +34,13 @@ class PackagingTest : public testing::Test {
 
     std::string Unit(const std::string& name) const {
         return ReadWholeFile(root.Path() / "usr/lib/systemd/system" / name);
+    }
+
+    void MakeAccounts() const {
+        fs::create_directories(root.Path() / "etc");
+        const ProcessResult accounts =
+            RunProcess({"/usr/bin/systemd-sysusers", "--root=" + root.Path().string()});
+        EXPECT_EQ(accounts.status, 0) << accounts.err;
     }
 
     // The system calls that a unit's filter allows: its lines count in order, each adding to what
@@ -135,6 +143,32 @@ TEST_F(PackagingTest, TheSchedulerHasAPrivateTmpWithItsOwnToolAndLeavesTasksRunn
     EXPECT_THAT(Unit("orva-tmp.service"), HasSubstr("\nRemainAfterExit=yes\n"));
 }
 
+TEST_F(PackagingTest, CleaningOldFilesLeavesTheNameThatTheSchedulersToolIsMountedOn) {
+    MakeAccounts();
+    std::string boot = ReadWholeFile("/proc/sys/kernel/random/boot_id");
+    std::erase_if(boot, [](char each) { return each == '-' || each == '\n'; });
+    const std::string privateTmp = "tmp/systemd-private-" + boot + "-orva-tmp.service-Xy12ab/tmp";
+    const std::string tool = root.Write(privateTmp + "/orvaschedtool", "");
+    const std::string old = root.Write(privateTmp + "/old", "");
+    const ProcessResult cleaned =
+        RunProcess({"/usr/bin/systemd-tmpfiles", "--root=" + root.Path().string(), "--clean",
+                    root.Path() / "usr/lib/tmpfiles.d/orva.conf",
+                    // What systemd says of private folders, and no file of whatever age is kept.
+                    root.Write("clean.conf",
+                               "d /tmp - - - 0\n"
+                               "x /tmp/systemd-private-%b-*\n"
+                               "X /tmp/systemd-private-%b-*/tmp\n")});
+    EXPECT_EQ(cleaned.status, 0) << cleaned.err;
+    EXPECT_TRUE(fs::exists(tool));
+    EXPECT_FALSE(fs::exists(old));
+}
+
+TEST_F(PackagingTest, TheServerCanMakeRecycleBinsInSharedFoldersBelowHome) {
+    const std::string unit = Unit("orva-webapid.service");
+    EXPECT_THAT(unit, HasSubstr("\nProtectSystem=full\n"));
+    EXPECT_THAT(unit, Not(HasSubstr("\nProtectHome=")));
+}
+
 TEST_F(PackagingTest, TheServerRunsAsAnAccountOfItsOwnWithoutAnyRightOfRoots) {
     const std::string unit = Unit("orva-webapid.service");
     for (const char* line :
@@ -160,10 +194,7 @@ TEST_F(PackagingTest, TheServerMayGiveARecycleBinToTheSharesGroupAndStaysWithout
 }
 
 TEST_F(PackagingTest, TheAccountAndTheFoldersCanBeMade) {
-    fs::create_directories(root.Path() / "etc");
-    const ProcessResult accounts =
-        RunProcess({"/usr/bin/systemd-sysusers", "--root=" + root.Path().string()});
-    EXPECT_EQ(accounts.status, 0) << accounts.err;
+    MakeAccounts();
     EXPECT_THAT(ReadWholeFile(root.Path() / "etc/passwd"), HasSubstr("orva:x:"));
     EXPECT_THAT(ReadWholeFile(root.Path() / "etc/group"), HasSubstr("orva:x:"));
     const ProcessResult folders =
