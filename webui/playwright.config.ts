@@ -15,8 +15,8 @@ export default defineConfig({
     testMatch: '*.browser.ts',
     outputDir: join(buildFolder, 'page-tests', 'results'),
     globalSetup: './tests/support/stage.ts',
-    // Every test has an appliance of its own; the machine has few cores.
-    workers: 1,
+    // Every test has an appliance of its own and waits for it half of the time.
+    workers: 2,
     timeout: 90_000,
     expect: { timeout: 15_000 },
     reporter: [['list']],

@@ -15,6 +15,7 @@
 #include "appliance/scheduler/PrivateView.h"
 #include "appliance/scheduler/RuntimeFiles.h"
 #include "appliance/store/TaskStore.h"
+#include "appliance/util/Journal.h"
 
 namespace {
 
@@ -91,7 +92,7 @@ int main(int argc, char** argv) {
         return orva::EndOfCommandLine("orva-schedd", app, error);
     }
 
-    ::openlog("orva-schedd", LOG_PID | LOG_PERROR, LOG_DAEMON);
+    ::openlog("orva-schedd", LOG_PID | orva::ForegroundLogOption(), LOG_DAEMON);
     if (!root.empty()) {
         orva::SetRoot(root);
     }

@@ -2,6 +2,7 @@
 #include <malloc.h>
 #include <signal.h>
 #include <syslog.h>
+#include <systemd/sd-daemon.h>
 
 #include <CLI/CLI.hpp>
 #include <cstdio>
@@ -23,6 +24,7 @@
 #include "appliance/server/TlsIdentity.h"
 #include "appliance/store/StoreFailure.h"
 #include "appliance/store/TaskStore.h"
+#include "appliance/util/Journal.h"
 #include "appliance/webapi/Dispatcher.h"
 #include "appliance/webapi/ModuleLoader.h"
 
@@ -180,12 +182,14 @@ int Run(const Arguments& arguments) {
     }
     std::printf("listening on %s\n", url.c_str());
     std::fflush(stdout);
+    ::sd_notify(0, "READY=1");
     if (arguments.signInLink) {
         PrintSignInLink(url, *token);
     }
 
     int signalNumber = 0;
     ::sigwait(&signals, &signalNumber);
+    ::sd_notify(0, "STOPPING=1");
     return Drain(*server, signals);
 }
 
@@ -223,7 +227,7 @@ int main(int argc, char** argv) {
         return orva::EndOfCommandLine("orva-webapid", app, error);
     }
 
-    ::openlog("orva-webapid", LOG_PID | LOG_PERROR, LOG_DAEMON);
+    ::openlog("orva-webapid", LOG_PID | orva::ForegroundLogOption(), LOG_DAEMON);
     if (!arguments.root.empty()) {
         orva::SetRoot(arguments.root);
     }

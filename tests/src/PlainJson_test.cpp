@@ -84,6 +84,7 @@ TEST(PlainJsonTest, YieldsWhatTheOrdinaryReaderYields) {
                              "{\"a\":[1,2],\"a\":[3]}",
                              "[\"\",\"\\\"\\\\\\/\\b\\f\\n\\r\\t\"]",
                              "[\"\\u0041\\u00e4\\u00DF\\u20ac\\uffff\"]",
+                             "[\"\\u007f\\u0080\\u07ff\\u0800\"]",
                              "[\"a\\u0000b\"]",
                              "{\"\\u00e4\\n\":\"x\"}",
                              "[\"\xC3\xA4\"]",

@@ -58,7 +58,8 @@ TEST_F(DatabaseGuardTest, TellsTheKindsOfFailureApart) {
                                                                          {SQLITE_NOMEM, 0x0200},
                                                                          {SQLITE_IOERR, 0x0600}}) {
         try {
-            orva::Guarded(database, [&] { throw SQLite::Exception("x", reported); });
+            orva::Guarded(database,
+                          [reported = reported] { throw SQLite::Exception("x", reported); });
             ADD_FAILURE() << "nothing was thrown for " << reported;
         } catch (const orva::StoreFailure& failure) {
             EXPECT_EQ(failure.Code(), code) << reported;
