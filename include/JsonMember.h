@@ -4,6 +4,9 @@
 
 #include <json/value.h>
 
+// The name of a member that is to be created, as a literal: jsoncpp copies any other name, twice.
+using Key = Json::StaticString;
+
 // The member `key` of `value`; null when `value` is no object or lacks it. Unlike jsoncpp's own
 // access it takes every type, creates nothing and never throws. The reference lives as long as
 // `value`.

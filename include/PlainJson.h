@@ -14,9 +14,10 @@
 // surrogates. What it yields equals what jsoncpp's older reader yields for the same text. False for
 // everything else, right or wrong, with `value` untouched.
 //
-// Members named in `frequentNames` get that name itself instead of a copy of it.
+// Members named in `frequentNames`, which are literals, get that name itself instead of a copy of
+// it.
 [[nodiscard]] bool ReadPlainJson(std::string_view text,
-                                 std::span<const Json::StaticString> frequentNames,
+                                 std::span<const std::string_view> frequentNames,
                                  Json::Value& value);
 
 // Writes `value` when it is plain: nested at most 32 levels deep, without holes in arrays, of

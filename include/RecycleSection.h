@@ -6,6 +6,7 @@
 
 #include <array>
 #include <string>
+#include <string_view>
 
 namespace RecycleSection {
 
@@ -43,6 +44,24 @@ constexpr std::array kSizeRules = {
              "reserve_policy_size_greater", " -m "},
     SizeRule{"size_smaller_check", "size_smaller", "reserve_policy_size_smaller_check",
              "reserve_policy_size_smaller", " -l "},
+};
+
+// All members' names.
+constexpr std::array<std::string_view, 14> kNames = {
+    kAction,
+    kCleanAll,
+    kShares,
+    kPolicy,
+    kDays,
+    kMegabytes,
+    kSortType,
+    kKeepRules,
+    kExtensionCheck,
+    kExtensions,
+    kSizeRules[0].check,
+    kSizeRules[0].megabytes,
+    kSizeRules[1].check,
+    kSizeRules[1].megabytes,
 };
 
 // Numbers and booleans as their text; empty for null, arrays and objects.

@@ -18,7 +18,7 @@ std::string WriteJsonText(const Json::Value& value) {
 }
 
 bool ParseJsonText(const std::string& text, Json::Value& value,
-                   std::span<const Json::StaticString> frequentNames) {
+                   std::span<const std::string_view> frequentNames) {
     if (ReadPlainJson(text, frequentNames, value)) {
         return true;
     }

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "include/ErrorCodes.h"
+#include "include/JsonMember.h"
 #include "include/TaskSchedulerBasicHandler.h"
 #include "include/lib.h"
 
@@ -39,7 +40,7 @@ constexpr const char* kAppFromJsonEvent = "Convert task from json (app) failed";
 void MoveMember(Json::Value& object, const char* from, const char* to) {
     Json::Value value;
     object.removeMember(from, &value);
-    object[to] = std::move(value);
+    object[Key(to)] = std::move(value);
 }
 
 // Takes the member out of the object; null when it is missing.
@@ -184,7 +185,7 @@ bool TaskSchedulerBasicHandler::SetData_v1(Json::Value& result) {
         SetError(kStoreFailed, "Failed to save task");
         return false;
     }
-    result["id"] = ORVASchedTaskGetID(*task);
+    result[Key("id")] = ORVASchedTaskGetID(*task);
     return true;
 }
 
@@ -220,26 +221,26 @@ bool TaskSchedulerBasicHandler::ReConstructJsonGet_Basic(Json::Value& document) 
     const std::string app = basic["app"].asString();
     TranslateActionKey(basic, app);
 
-    document["id"] = std::move(basic["id"]);
-    document["name"] = std::move(basic["task_name"]);
-    document["action"] = std::move(basic["action"]);
-    document["type"] = GetAppKeyFromNameSpace(app);
-    document["can_edit_name"] = std::move(basic["can_edit_name"]);
-    document["can_edit_owner"] = GetAppEditOwnerValue();
-    document["enable"] = strcasecmp(basic["enabled"].asString().c_str(), "on") == 0;
-    document["owner"] = std::move(basic["owner"]);
+    document[Key("id")] = std::move(basic["id"]);
+    document[Key("name")] = std::move(basic["task_name"]);
+    document[Key("action")] = std::move(basic["action"]);
+    document[Key("type")] = GetAppKeyFromNameSpace(app);
+    document[Key("can_edit_name")] = std::move(basic["can_edit_name"]);
+    document[Key("can_edit_owner")] = GetAppEditOwnerValue();
+    document[Key("enable")] = strcasecmp(basic["enabled"].asString().c_str(), "on") == 0;
+    document[Key("owner")] = std::move(basic["owner"]);
     return true;
 }
 
 bool TaskSchedulerBasicHandler::ReConstructJsonSet_Basic(Json::Value& document) {
     Json::Value basic(Json::objectValue);
-    basic["id"] = document.isMember("id") ? document["id"].asString() : "-1";
-    basic["task_name"] = TakeMember(document, "name");
-    basic["owner"] = TakeMember(document, "owner");
-    basic["enabled"] = document["enable"].asBool() ? "on" : "off";
+    basic[Key("id")] = document.isMember("id") ? document["id"].asString() : "-1";
+    basic[Key("task_name")] = TakeMember(document, "name");
+    basic[Key("owner")] = TakeMember(document, "owner");
+    basic[Key("enabled")] = document["enable"].asBool() ? "on" : "off";
     document.removeMember("id");
     document.removeMember("enable");
-    document["basic"] = std::move(basic);
+    document[Key("basic")] = std::move(basic);
     return true;
 }
 

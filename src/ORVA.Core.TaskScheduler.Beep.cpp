@@ -4,6 +4,7 @@
 #include <system_error>
 #include <utility>
 
+#include "include/JsonMember.h"
 #include "include/JsonText.h"
 #include "include/TaskSchedulerBeepHandler.h"
 
@@ -45,7 +46,7 @@ bool TaskSchedulerBeepHandler::ConvertToJson_App(const _tag_orva_sched_task_& ta
     } else {
         ParseJsonText(ORVASchedTaskGetAppArgs(task), app);
     }
-    document["app"] = std::move(app);
+    document[Key("app")] = std::move(app);
     return true;
 }
 

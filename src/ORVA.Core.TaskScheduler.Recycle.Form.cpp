@@ -26,7 +26,7 @@ Json::Value NumberOf(const Json::Value& value) {
 
 // The member as an object to write to; anything else that stands there gives way to an empty one.
 Json::Value& ObjectMember(Json::Value& parent, const char* key) {
-    Json::Value& member = parent[key];
+    Json::Value& member = parent[Key(key)];
     if (!member.isObject()) {
         member = Json::Value(Json::objectValue);
     }
@@ -39,25 +39,25 @@ Json::Value& ObjectMember(Json::Value& parent, const char* key) {
 void TakeInteger(const Json::Value& form, const char* formKey, Json::Value& flat, const char* key) {
     const Json::Value& number = MemberOf(form, formKey);
     if (IsJsonInteger(number)) {
-        flat[key] = number.asString();
+        flat[Key(key)] = number.asString();
     }
 }
 
 void TakePolicy(const Json::Value& formFiles, Json::Value& flat) {
     const Json::Value& policy = MemberOf(formFiles, "policy");
     if (policy == "size") {
-        flat[kPolicy] = kPolicyBySize;
+        flat[Key(kPolicy)] = kPolicyBySize;
         TakeInteger(formFiles, "size", flat, kMegabytes);
         const Json::Value& sortType = formFiles["sort_type"];
         if (IsJsonInteger(sortType)) {
             const bool oldFirst = sortType.isInt() && sortType.asInt() == kFormOldFilesFirst;
-            flat[kSortType] = oldFirst ? kOldFilesFirst : kLargeFilesFirst;
+            flat[Key(kSortType)] = oldFirst ? kOldFilesFirst : kLargeFilesFirst;
         }
     } else if (policy == "time") {
-        flat[kPolicy] = kPolicyByTime;
+        flat[Key(kPolicy)] = kPolicyByTime;
         TakeInteger(formFiles, "time", flat, kDays);
     } else if (policy.isString()) {
-        flat[kPolicy] = kPolicyDefault;
+        flat[Key(kPolicy)] = kPolicyDefault;
     }
 }
 
@@ -66,7 +66,7 @@ void TakeKeepRules(const Json::Value& formRules, Json::Value& flat) {
         const Json::Value& check = MemberOf(formRules, rule.formCheck);
         if (check.isBool()) {
             Json::Value& keepRules = ObjectMember(flat, kKeepRules);
-            keepRules[rule.check] = OnOrOff(check.asBool());
+            keepRules[Key(rule.check)] = OnOrOff(check.asBool());
             if (check.asBool()) {
                 TakeInteger(formRules, rule.formMegabytes, keepRules, rule.megabytes);
             }
@@ -75,10 +75,10 @@ void TakeKeepRules(const Json::Value& formRules, Json::Value& flat) {
     const Json::Value& check = MemberOf(formRules, "extension_check");
     if (check.isBool()) {
         Json::Value& keepRules = ObjectMember(flat, kKeepRules);
-        keepRules[kExtensionCheck] = OnOrOff(check.asBool());
+        keepRules[Key(kExtensionCheck)] = OnOrOff(check.asBool());
         const Json::Value& extensions = formRules["extension"];
         if (check.asBool() && extensions.isArray()) {
-            keepRules[kExtensions] = extensions;
+            keepRules[Key(kExtensions)] = extensions;
         }
     }
 }
@@ -91,36 +91,36 @@ bool TaskSchedulerRecycleHandler::ReConstructJsonGet_App(Json::Value& app) {
     }
 
     Json::Value& formShares = ObjectMember(app, kFormShares);
-    formShares["clean_all"] = TextOf(app[kCleanAll]) == "yes";
-    formShares["shares"] = std::move(app[kShares]);
+    formShares[Key("clean_all")] = TextOf(app[kCleanAll]) == "yes";
+    formShares[Key("shares")] = std::move(app[kShares]);
 
     Json::Value& formFiles = ObjectMember(app, kFormFiles);
     const std::string policy = TextOf(app[kPolicy]);
     if (policy == kPolicyBySize) {
-        formFiles["policy"] = "size";
-        formFiles["size"] = NumberOf(app[kMegabytes]);
-        formFiles["sort_type"] =
+        formFiles[Key("policy")] = "size";
+        formFiles[Key("size")] = NumberOf(app[kMegabytes]);
+        formFiles[Key("sort_type")] =
             TextOf(app[kSortType]) == kLargeFilesFirst ? kFormLargeFilesFirst : kFormOldFilesFirst;
     } else if (policy == kPolicyByTime) {
-        formFiles["policy"] = "time";
-        formFiles["time"] = NumberOf(app[kDays]);
+        formFiles[Key("policy")] = "time";
+        formFiles[Key("time")] = NumberOf(app[kDays]);
     } else {
-        formFiles["policy"] = "clean_all";
+        formFiles[Key("policy")] = "clean_all";
     }
 
     const Json::Value& keepRules = app[kKeepRules];
     Json::Value& formRules = ObjectMember(formFiles, kFormKeepRules);
     for (const SizeRule& rule : kSizeRules) {
         const bool check = IsOn(MemberOf(keepRules, rule.check));
-        formRules[rule.formCheck] = check;
+        formRules[Key(rule.formCheck)] = check;
         if (check) {
-            formRules[rule.formMegabytes] = NumberOf(MemberOf(keepRules, rule.megabytes));
+            formRules[Key(rule.formMegabytes)] = NumberOf(MemberOf(keepRules, rule.megabytes));
         }
     }
     const bool extensionCheck = IsOn(MemberOf(keepRules, kExtensionCheck));
-    formRules["extension_check"] = extensionCheck;
+    formRules[Key("extension_check")] = extensionCheck;
     if (extensionCheck) {
-        formRules["extension"] = MemberOf(keepRules, kExtensions);
+        formRules[Key("extension")] = MemberOf(keepRules, kExtensions);
     }
 
     for (const char* key :
@@ -141,15 +141,15 @@ bool TaskSchedulerRecycleHandler::ReConstructJsonSet_App(Json::Value& app) {
 
     const Json::Value& form = app;
     if (form.isMember(kEnableRecycle)) {
-        flat[kEnableRecycle] = form[kEnableRecycle];
+        flat[Key(kEnableRecycle)] = form[kEnableRecycle];
     }
 
     const Json::Value& formShares = form[kFormShares];
     if (MemberOf(formShares, "shares").isArray()) {
-        flat[kShares] = formShares["shares"];
+        flat[Key(kShares)] = formShares["shares"];
     }
     if (MemberOf(formShares, "clean_all").isBool()) {
-        flat[kCleanAll] = formShares["clean_all"].asBool() ? "yes" : "no";
+        flat[Key(kCleanAll)] = formShares["clean_all"].asBool() ? "yes" : "no";
     }
 
     const Json::Value& formFiles = form[kFormFiles];

@@ -152,12 +152,12 @@ bool TaskSchedulerRecycleHandler::ConvertToJson_App(const _tag_orva_sched_task_&
                                                     Json::Value& document) {
     Json::Value app;
     if (ORVASchedTaskIsNew(task)) {
-        app[kAction] = kActionClean;
-        app[kCleanAll] = "yes";
+        app[Key(kAction)] = kActionClean;
+        app[Key(kCleanAll)] = "yes";
     } else {
-        ParseJsonText(ORVASchedTaskGetAppArgs(task), app);
+        ParseJsonText(ORVASchedTaskGetAppArgs(task), app, kNames);
     }
-    document["app"] = std::move(app);
+    document[Key("app")] = std::move(app);
     return true;
 }
 

@@ -1,6 +1,7 @@
 #include <string>
 #include <utility>
 
+#include "include/JsonMember.h"
 #include "include/JsonText.h"
 #include "include/TaskSchedulerScriptHandler.h"
 
@@ -12,7 +13,7 @@ bool TaskSchedulerScriptHandler::ConvertToJson_App(const _tag_orva_sched_task_& 
     } else {
         ParseJsonText(ORVASchedTaskGetAppArgs(task), app);
     }
-    document["app"] = std::move(app);
+    document[Key("app")] = std::move(app);
     return true;
 }
 

@@ -30,7 +30,8 @@ const Json::StaticString kName("name");
 const Json::StaticString kDisplayName("display_name");
 const Json::StaticString kServiceType("service_type");
 const Json::StaticString kEnabled("enabled");
-const std::array kEntryNames = {kName, kDisplayName, kServiceType, kEnabled};
+const std::array<std::string_view, 4> kEntryNames = {kName.c_str(), kDisplayName.c_str(),
+                                                     kServiceType.c_str(), kEnabled.c_str()};
 
 constexpr const char* kStoredStop = "0";
 constexpr const char* kStoredStart = "1";
@@ -295,7 +296,7 @@ bool TaskSchedulerServiceHandler::ConvertToJson_App(const _tag_orva_sched_task_&
             return false;
         }
     }
-    document["app"] = std::move(app);
+    document[Key("app")] = std::move(app);
     return true;
 }
 

@@ -41,7 +41,7 @@ void AppendUtf8(std::string& text, unsigned codePoint) {
 // Each function reads one piece at the current place; false when it is not plain.
 class PlainReader {
   public:
-    PlainReader(std::string_view text, std::span<const Json::StaticString> frequentNames)
+    PlainReader(std::string_view text, std::span<const std::string_view> frequentNames)
         : at(text.data()), end(text.data() + text.size()), frequent(frequentNames) {}
 
     bool Document(Json::Value& value) {
@@ -132,9 +132,9 @@ class PlainReader {
     }
 
     Json::Value& Member(Json::Value& object, std::string_view name) {
-        for (const Json::StaticString& each : frequent) {
-            if (name == each.c_str()) {
-                return object[each];
+        for (const std::string_view each : frequent) {
+            if (name == each) {
+                return object[Json::StaticString(each.data())];
             }
         }
         return *object.demand(name.data(), name.data() + name.size());
@@ -232,7 +232,7 @@ class PlainReader {
 
     const char* at;
     const char* const end;
-    const std::span<const Json::StaticString> frequent;
+    const std::span<const std::string_view> frequent;
     std::string unescaped;
 };
 
@@ -340,7 +340,7 @@ class PlainWriter {
 
 }  // namespace
 
-bool ReadPlainJson(std::string_view text, std::span<const Json::StaticString> frequentNames,
+bool ReadPlainJson(std::string_view text, std::span<const std::string_view> frequentNames,
                    Json::Value& value) {
     Json::Value read;
     if (!PlainReader(text, frequentNames).Document(read)) {

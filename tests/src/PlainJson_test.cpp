@@ -153,7 +153,7 @@ TEST(PlainJsonTest, ReadsThirtyTwoLevels) {
 }
 
 TEST(PlainJsonTest, FrequentNamesMakeNoDifferenceToTheResult) {
-    const std::array names = {Json::StaticString("name"), Json::StaticString("enabled")};
+    constexpr std::array<std::string_view, 2> names = {"name", "enabled"};
     const std::string text = R"([{"enabled":true,"name":"a","names":1},{"nam":2,"name":"b"}])";
     Json::Value value;
     ASSERT_TRUE(ReadPlainJson(text, names, value));
