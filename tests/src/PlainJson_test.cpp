@@ -149,6 +149,9 @@ TEST(PlainJsonTest, ReadsThirtyTwoLevels) {
     };
     ExpectSameAsOrdinary(nested(32));
     EXPECT_FALSE(Plain(nested(33)));
+    EXPECT_FALSE(Plain("{\"a\":" + nested(31) + ",\"b\":" + nested(32) + "}"));
+    ExpectSameAsOrdinary("{\"a\":" + nested(31) + "}");
+    EXPECT_FALSE(Plain(std::string(32, '[') + "{}" + std::string(32, ']')));
     EXPECT_FALSE(Plain(std::string(1'000'000, '[')));
 }
 
@@ -277,9 +280,19 @@ TEST(PlainJsonTest, WritesThirtyTwoLevels) {
         nested = outer;
     }
     EXPECT_EQ(WritePlainJson(nested), OrdinaryText(nested));
-    Json::Value outer(Json::objectValue);
-    outer["a"] = nested;
-    EXPECT_EQ(WritePlainJson(outer), std::nullopt);
+    Json::Value object(Json::objectValue);
+    object["a"] = nested;
+    EXPECT_EQ(WritePlainJson(object), std::nullopt);
+    Json::Value array(Json::arrayValue);
+    array.append(nested);
+    EXPECT_EQ(WritePlainJson(array), std::nullopt);
+    nested = Json::Value(Json::objectValue);
+    for (int level = 0; level < 32; ++level) {
+        Json::Value outer(Json::arrayValue);
+        outer.append(nested);
+        nested = outer;
+    }
+    EXPECT_EQ(WritePlainJson(nested), std::nullopt);
 }
 
 TEST(PlainJsonTest, WritesWhatTheOrdinaryWriterWrites) {
